@@ -1,0 +1,28 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "host/sys/openmp.h"
+
+#include <omp.h>
+
+#include <algorithm>
+
+namespace zarn::sys {
+
+int OMPGetMaxThreads() { return omp_get_max_threads(); }
+
+int OMPGetNumThreads() { return omp_get_num_threads(); }
+
+int OMPGetThreadNum() { return omp_get_thread_num(); }
+
+OMPDynamic::OMPDynamic(bool dynamic) : previous_(omp_get_dynamic()) {
+  omp_set_dynamic(dynamic ? 1 : 0);
+}
+
+OMPDynamic::~OMPDynamic() { omp_set_dynamic(previous_); }
+
+OMPThreadCount::OMPThreadCount(std::int64_t count) : previous_(omp_get_max_threads()) {
+  omp_set_num_threads(static_cast<int>(std::clamp<std::int64_t>(count, 1, previous_)));
+}
+
+OMPThreadCount::~OMPThreadCount() { omp_set_num_threads(previous_); }
+
+}  // namespace zarn::sys

@@ -1,0 +1,42 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+
+#include "host/hostexport.h"
+
+namespace zarn::sys {
+
+/// Threads that the next parallel region of the calling thread may use.
+ZARN_HOST_EXPORT int OMPGetMaxThreads();
+/// Threads of the innermost active parallel region; 1 outside.
+ZARN_HOST_EXPORT int OMPGetNumThreads();
+/// Number of the calling thread within its region, from 0.
+ZARN_HOST_EXPORT int OMPGetThreadNum();
+
+/// Sets dynamic adjustment of the thread count for its lifetime and restores it afterwards.
+class ZARN_HOST_EXPORT OMPDynamic {
+ public:
+  explicit OMPDynamic(bool dynamic);
+  OMPDynamic(const OMPDynamic&) = delete;
+  OMPDynamic& operator=(const OMPDynamic&) = delete;
+  ~OMPDynamic();
+
+ private:
+  int previous_;
+};
+
+/// Sets the thread count of the next regions for its lifetime and restores it afterwards. The
+/// request is kept within 1 .. `OMPGetMaxThreads()`: a pixel count may be passed as it is.
+class ZARN_HOST_EXPORT OMPThreadCount {
+ public:
+  explicit OMPThreadCount(std::int64_t count);
+  OMPThreadCount(const OMPThreadCount&) = delete;
+  OMPThreadCount& operator=(const OMPThreadCount&) = delete;
+  ~OMPThreadCount();
+
+ private:
+  int previous_;
+};
+
+}  // namespace zarn::sys

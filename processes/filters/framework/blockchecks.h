@@ -1,0 +1,36 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <vector>
+
+#include "host/gobs/raster.h"
+#include "processes/filters/framework/filterresult.h"
+
+namespace zarn::processes::filters {
+
+/// What a filter refuses before it writes anything. Each check returns the failure to hand back, or
+/// nothing when the blocks pass.
+namespace blockchecks {
+
+using Refusal = std::optional<FilterResult>;
+
+/// Equal widths, and an input at least as high as the output (a taller input is accepted).
+Refusal CheckCoversOutput(const gobs::RasterInfo& input, const gobs::RasterInfo& output);
+
+/// Both margins of the input reach `half` pixels; no margin is enough for a negative `half`.
+Refusal CheckMargins(const gobs::RasterInfo& input, std::int64_t half);
+
+/// Whether a filter may write into its own input.
+enum class Aliasing { kForbidden, kSameBlockAllowed };
+
+/// What every family refuses after its own checks, because processing would read or write out of
+/// bounds: another type or channel count, short no-data lists (empty lists are fine), blocks
+/// without data or smaller than described, and overlapping memory; in this order.
+Refusal CheckBlocks(const gobs::Raster& input, const gobs::Raster& output,
+                    const std::vector<double>& inputNoData, const std::vector<double>& outputNoData,
+                    Aliasing aliasing);
+
+}  // namespace blockchecks
+}  // namespace zarn::processes::filters

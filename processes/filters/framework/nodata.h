@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <algorithm>
+#include <cmath>
+#include <cstddef>
+#include <limits>
+#include <type_traits>
+#include <vector>
+
+#include "host/gobs/saturatecast.h"
+
+namespace zarn::processes::filters {
+
+/// One entry of a no-data list as a sample: integers are rounded half away from zero and clamped to
+/// the type (NaN becomes 0); floating types narrow.
+template <typename T>
+T RoundToSample(double value) {
+  if constexpr (std::is_floating_point_v<T>) {
+    return gobs::SaturateCast<T>(value);
+  } else {
+    return gobs::SaturateCast<T>(value >= 0 ? value + 0.5 : value - 0.5);
+  }
+}
+
+/// A background value as a sample: truncated towards zero and saturated.
+template <typename T>
+T TruncateToSample(double value) {
+  return gobs::SaturateCast<T>(value);
+}
+
+/// A no-data list as samples; an empty list stays empty (the feature is off).
+template <typename T>
+std::vector<T> ConvertNoData(const std::vector<double>& list) {
+  std::vector<T> samples(list.size());
+  std::transform(list.begin(), list.end(), samples.begin(), RoundToSample<T>);
+  return samples;
+}
+
+/// Exact equality of whole pixels; NaN never equals anything.
+template <typename T>
+bool PixelEquals(const T* pixel, const T* value, std::size_t channels) {
+  for (std::size_t c = 0; c < channels; ++c) {
+    if (!(pixel[c] == value[c])) return false;
+  }
+  return true;
+}
+
+/// Equality of whole pixels: exact for integers; for floating types the difference of each channel,
+/// in double, must stay below the tolerance.
+template <typename T>
+bool PixelNearlyEquals(const T* pixel, const T* value, std::size_t channels) {
+  if constexpr (std::is_floating_point_v<T>) {
+    constexpr double kTolerance = 2.220446049250313e-16;
+    for (std::size_t c = 0; c < channels; ++c) {
+      const double difference = static_cast<double>(pixel[c]) - static_cast<double>(value[c]);
+      if (!(std::abs(difference) < kTolerance)) return false;
+    }
+    return true;
+  } else {
+    return PixelEquals(pixel, value, channels);
+  }
+}
+
+}  // namespace zarn::processes::filters

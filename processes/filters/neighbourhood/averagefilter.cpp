@@ -1,0 +1,74 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "processes/filters/neighbourhood/averagefilter.h"
+
+#include <optional>
+#include <type_traits>
+#include <vector>
+
+#include "host/gobs/datatypeadapter.h"
+#include "processes/filters/framework/blockchecks.h"
+#include "processes/filters/framework/parallel.h"
+#include "processes/filters/framework/sampletypes.h"
+#include "processes/filters/neighbourhood/averagerows.h"
+
+namespace zarn::processes::filters {
+namespace {
+
+constexpr const char* kUnknownType = "Unknown raster block data type for average filter.";
+
+struct Bounds {
+  double low;
+  double high;
+};
+
+template <typename T>
+std::vector<OutputConverter<T>> MakeConverters(const std::vector<Bounds>& bounds,
+                                               const std::vector<double>& outputNoData) {
+  std::vector<OutputConverter<T>> converters;
+  converters.reserve(bounds.size());
+  for (std::size_t c = 0; c < bounds.size(); ++c) {
+    const std::optional<double> noData =
+        outputNoData.empty() ? std::nullopt : std::optional(outputNoData[c]);
+    converters.emplace_back(bounds[c].low, bounds[c].high, noData);
+  }
+  return converters;
+}
+
+}  // namespace
+
+FilterResult CPUAverageFilter::Process(const gobs::Raster& input, gobs::Raster& output,
+                                       std::uint32_t /*blockX*/, std::uint32_t /*blockY*/,
+                                       const std::uint8_t* inputMask) {
+  const gobs::NativeDataTypeCode code = gobs::GetDataTypeCode(input);
+  std::vector<Bounds> bounds;
+  for (std::uint32_t c = 0; c < input.Channels(); ++c) {
+    bounds.push_back(
+        {gobs::DataTypeAdapter::MinValue(code), gobs::DataTypeAdapter::MaxValue(code)});
+  }
+  return VisitSampleType(code, kUnknownType, [&]<typename T>(std::type_identity<T>) {
+    const int half = HalfWindow(kernelSize);
+    if (auto refusal = blockchecks::CheckCoversOutput(input, output)) return *refusal;
+    if (auto refusal = blockchecks::CheckMargins(input, half)) return *refusal;
+    if (auto refusal = blockchecks::CheckBlocks(input, output, inputNoData, outputNoData,
+                                                blockchecks::Aliasing::kForbidden)) {
+      return *refusal;
+    }
+    const AverageJob<T> job{
+        BlockView<const T>(input),
+        BlockView<T>(output),
+        BlockView<const std::uint8_t>::Beside(input, inputMask, 1),
+        WindowRules<T>(input, inputNoData, outputNoData, noDataValue, inputMask),
+        MakeConverters<T>(bounds, outputNoData),
+        half,
+    };
+    const std::ptrdiff_t rows = job.output.Height();
+    parallel::AllowDynamicThreads();
+    parallel::ForEachRowBand(rows, parallel::BandCount(rows),
+                             [&](std::ptrdiff_t, std::ptrdiff_t begin, std::ptrdiff_t end) {
+                               AverageRows(job, begin, end);
+                             });
+    return FilterResult::Success();
+  });
+}
+
+}  // namespace zarn::processes::filters
