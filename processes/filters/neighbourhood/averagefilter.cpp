@@ -1,6 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "processes/filters/neighbourhood/averagefilter.h"
 
+#include <cstddef>
+#include <memory>
+#include <new>
 #include <optional>
 #include <type_traits>
 #include <vector>
@@ -10,6 +13,9 @@
 #include "processes/filters/framework/parallel.h"
 #include "processes/filters/framework/sampletypes.h"
 #include "processes/filters/neighbourhood/averagerows.h"
+#if ZARN_SIMD
+#include "processes/filters/neighbourhood/averagefilter_simd.h"
+#endif
 
 namespace zarn::processes::filters {
 namespace {
@@ -32,6 +38,27 @@ std::vector<OutputConverter<T>> MakeConverters(const std::vector<Bounds>& bounds
     converters.emplace_back(bounds[c].low, bounds[c].high, noData);
   }
   return converters;
+}
+
+template <typename T>
+void AverageBlock(const AverageJob<T>& job) {
+  const std::ptrdiff_t rows = job.output.Height();
+  const std::ptrdiff_t bands = parallel::BandCount(rows);
+#if ZARN_SIMD
+  constexpr std::align_val_t kAlignment{64};
+  const std::size_t bytes = AverageScratchBytes(job);
+  const auto release = [&](std::byte* memory) { ::operator delete[](memory, kAlignment); };
+  const std::unique_ptr<std::byte[], decltype(release)> scratch(
+      new (kAlignment) std::byte[bytes * static_cast<std::size_t>(bands)], release);
+  const auto average = [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
+    AverageRowsSimd(job, begin, end, scratch.get() + static_cast<std::size_t>(band) * bytes);
+  };
+#else
+  const auto average = [&](std::ptrdiff_t, std::ptrdiff_t begin, std::ptrdiff_t end) {
+    AverageRows(job, begin, end);
+  };
+#endif
+  parallel::ForEachRowBand(rows, bands, average);
 }
 
 }  // namespace
@@ -61,12 +88,8 @@ FilterResult CPUAverageFilter::Process(const gobs::Raster& input, gobs::Raster& 
         MakeConverters<T>(bounds, outputNoData),
         half,
     };
-    const std::ptrdiff_t rows = job.output.Height();
     parallel::AllowDynamicThreads();
-    parallel::ForEachRowBand(rows, parallel::BandCount(rows),
-                             [&](std::ptrdiff_t, std::ptrdiff_t begin, std::ptrdiff_t end) {
-                               AverageRows(job, begin, end);
-                             });
+    AverageBlock(job);
     return FilterResult::Success();
   });
 }
