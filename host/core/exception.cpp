@@ -5,9 +5,6 @@
 
 namespace zarn {
 
-Exception::Exception(std::string message, std::source_location where)
-    : Exception(std::move(message), where.file_name(), where.function_name(), where.line()) {}
-
 Exception::Exception(std::string message, std::string sourceFile, std::string function,
                      std::uint32_t line)
     : message_(std::move(message)),

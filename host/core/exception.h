@@ -3,7 +3,6 @@
 
 #include <cstdint>
 #include <exception>
-#include <source_location>
 #include <string>
 
 #include "host/hostexport.h"
@@ -12,11 +11,14 @@ namespace zarn {
 
 /// Base of everything the library throws. `Message()` says what went wrong; source file, function
 /// and line say where it was thrown. The source file may be a logical path ("gobs/raster/raster").
+///
+/// The place defaults to that of the caller, through the built-ins behind `std::source_location`,
+/// which clang has only from version 15.
 class ZARN_HOST_EXPORT Exception : public std::exception {
  public:
-  explicit Exception(std::string message,
-                     std::source_location where = std::source_location::current());
-  Exception(std::string message, std::string sourceFile, std::string function, std::uint32_t line);
+  explicit Exception(std::string message, std::string sourceFile = __builtin_FILE(),
+                     std::string function = __builtin_FUNCTION(),
+                     std::uint32_t line = __builtin_LINE());
   Exception(const Exception&) = default;
   Exception& operator=(const Exception&) = default;
   ~Exception() override;

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "host/gobs/datatypeadapter.h"
 
+#include <cstdint>
 #include <limits>
-#include <source_location>
 #include <string>
 
 #include "host/core/exception.h"
@@ -21,8 +21,8 @@ constexpr Limits LimitsOf() {
           static_cast<double>(std::numeric_limits<T>::max())};
 }
 
-Limits LimitsOfCode(NativeDataTypeCode code, const char* operation,
-                    const std::source_location& where) {
+Limits LimitsOfCode(NativeDataTypeCode code, const char* operation, const char* signature,
+                    std::uint32_t line) {
   switch (code) {
     case NativeDataTypeCode::kUInt8:
       return LimitsOf<std::uint8_t>();
@@ -54,17 +54,17 @@ Limits LimitsOfCode(NativeDataTypeCode code, const char* operation,
   }
   throw ParameterException(
       "Cannot evaluate " + std::string(operation) + " for the provided datatype", "eDataType", 1,
-      "gobs/raster/datatypeadapter", where.function_name(), where.line());
+      "gobs/raster/datatypeadapter", signature, line);
 }
 
 }  // namespace
 
 double DataTypeAdapter::MinValue(NativeDataTypeCode eDataType) {
-  return LimitsOfCode(eDataType, "MinValue()", std::source_location::current()).min;
+  return LimitsOfCode(eDataType, "MinValue()", __PRETTY_FUNCTION__, __LINE__).min;
 }
 
 double DataTypeAdapter::MaxValue(NativeDataTypeCode eDataType) {
-  return LimitsOfCode(eDataType, "MaxValue()", std::source_location::current()).max;
+  return LimitsOfCode(eDataType, "MaxValue()", __PRETTY_FUNCTION__, __LINE__).max;
 }
 
 }  // namespace zarn::gobs

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <cstdint>
-#include <source_location>
 #include <type_traits>
 #include <vector>
 
@@ -88,10 +87,9 @@ class ExtendDispatchTypes {
   /// Throws `Exception` when `types` is empty or no type of the list matches.
   static Interface* Dispatch(const std::vector<gobs::DataType>& types, bool allowComplex) {
     constexpr const char* kSource = "core/typedispatch/extendtypedispatch";
-    const auto where = std::source_location::current();
     if (types.empty()) {
       throw Exception("Not enough type in the vector for the dispatcher you are using.", kSource,
-                      where.function_name(), where.line());
+                      __PRETTY_FUNCTION__, __LINE__);
     }
     using Head = typename RemainingList::Head;
     using Tail = typename RemainingList::Tail;
@@ -100,7 +98,7 @@ class ExtendDispatchTypes {
     head.isComplex = 1;
     if (allowComplex && types.front() == head) return Factory::template Create<Head>();
     if constexpr (std::is_same_v<Tail, End>) {
-      throw Exception("Invalid type requested.", kSource, where.function_name(), where.line());
+      throw Exception("Invalid type requested.", kSource, __PRETTY_FUNCTION__, __LINE__);
     } else {
       return ExtendDispatchTypes<Factory, Consumed, FullList, Tail, End>::Dispatch(types,
                                                                                    allowComplex);

@@ -12,6 +12,17 @@
 
 namespace zarn::processes::filters {
 
+/// Whether a result counts as the no-data value: exactly for integers, within 1e-5 for floating
+/// types.
+template <typename T>
+bool TouchesNoData(T value, T noData) {
+  if constexpr (std::is_floating_point_v<T>) {
+    return std::abs(static_cast<double>(value) - static_cast<double>(noData)) < 1e-5;
+  } else {
+    return value == noData;
+  }
+}
+
 /// Brings a computed double back into the sample type of one channel, within bounds, and never onto
 /// the channel's output no-data value.
 ///
@@ -63,13 +74,7 @@ class OutputConverter {
     }
   }
 
-  bool Touches(T value) const {
-    if constexpr (kFloating) {
-      return std::abs(static_cast<double>(value) - static_cast<double>(noData_)) < kTolerance;
-    } else {
-      return value == noData_;
-    }
-  }
+  bool Touches(T value) const { return TouchesNoData(value, noData_); }
 
   // The nearest admissible values on either side of the no-data value. At large magnitudes the
   // tolerance is less than half a unit in the last place and would round back onto it.

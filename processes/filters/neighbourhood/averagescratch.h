@@ -15,19 +15,11 @@ namespace zarn::processes::filters {
 /// What the vector kernels add up in: the narrowest type that holds every sum of a window exactly.
 enum class SumType { kUInt16, kInt32, kDouble };
 
-/// The type that the rows of the ring hold: 8- and 16-bit samples as unsigned ones.
-template <typename T>
-struct StoredSample {
-  using Type = T;
-};
-template <>
-struct StoredSample<std::int8_t> {
-  using Type = std::uint8_t;
-};
-template <>
-struct StoredSample<std::int16_t> {
-  using Type = std::uint16_t;
-};
+/// What counts the pixels of a window beside sums of type `Acc`.
+template <typename Acc>
+using CountFor = std::conditional_t<
+    std::is_same_v<Acc, std::uint16_t>, std::uint8_t,
+    std::conditional_t<std::is_same_v<Acc, std::int32_t>, std::uint16_t, std::uint32_t>>;
 
 /// Rounded division of 16-bit sums by a constant, as a multiplication:
 /// (sum + bias) * multiplier >> (16 + shift). An odd divisor leaves no ties.
@@ -55,41 +47,56 @@ struct Reciprocal16 {
   }
 };
 
-/// The sizes of one call, in elements.
-struct AverageShape {
+/// How the vector kernels go about one call.
+struct AveragePlan {
   std::size_t taps;      ///< side of the window
   std::size_t channels;  ///< samples per pixel
-  std::size_t pixels;    ///< pixels of an input row within reach of the output
-  std::size_t samples;   ///< their samples
-  std::size_t outputs;   ///< samples of an output row
-  std::size_t slots;     ///< rows in the ring: the window's and the one that has just left it
+  std::size_t strip;     ///< columns that are processed at a time, so that their rows stay in cache
   SumType sum;
-  bool floatDivides;  ///< single precision rounds every mean as double does
   Reciprocal16 reciprocal;
+  bool floatDivides;      ///< division in single precision rounds every mean correctly
+  bool floatMultiplies;   ///< so does multiplication by the reciprocal, for whole windows
+  bool doubleMultiplies;  ///< the same in double precision
+
+  std::uint64_t Window() const { return std::uint64_t{taps} * taps; }
+  /// Pixels and samples of an input row of a strip.
+  std::size_t Pixels() const { return strip + taps - 1; }
+  std::size_t Samples() const { return Pixels() * channels; }
+  /// Samples of an output row of a strip.
+  std::size_t Outputs() const { return strip * channels; }
 
   template <typename T>
-  static AverageShape Of(const AverageJob<T>& job) {
-    AverageShape shape{};
-    shape.taps = 2 * static_cast<std::size_t>(job.half) + 1;
-    shape.channels = static_cast<std::size_t>(job.input.Channels());
-    const auto width = static_cast<std::size_t>(job.output.Width());
-    shape.pixels = width + shape.taps - 1;
-    shape.samples = shape.pixels * shape.channels;
-    shape.outputs = width * shape.channels;
-    shape.slots = shape.taps + 1;
-    const std::uint64_t window = std::uint64_t{shape.taps} * shape.taps;
-    shape.sum = SumTypeFor(std::is_integral_v<T> ? sizeof(T) : 8, window);
-    // Quotients stay below 2^bits, so a float rounds them by less than 2^(bits - 24), which must
-    // not reach the distance 1 / (2 * window) between a quotient and a tie.
+  static AveragePlan Of(const AverageJob<T>& job) {
+    AveragePlan plan{};
+    plan.taps = 2 * static_cast<std::size_t>(job.half) + 1;
+    plan.channels = static_cast<std::size_t>(job.input.Channels());
+    const std::uint64_t window = plan.Window();
+    plan.sum = SumTypeFor(std::is_integral_v<T> ? sizeof(T) : 8, window);
+    // Wide windows read the columns at a strip's ends twice, so their strips must be wide, too.
+    const std::size_t samples = plan.sum == SumType::kUInt16 ? kNarrowSums : kWideSums;
+    plan.strip = std::min(
+        std::max(samples / std::max<std::size_t>(plan.channels, 1), kStripTaps * plan.taps),
+        static_cast<std::size_t>(job.output.Width()));
+    plan.reciprocal = Reciprocal16::Of(window);
+    // Quotients stay below 2^bits. A float quotient is off by up to 2^(bits - 24), a product with a
+    // rounded reciprocal by twice as much; in double by 2^(bits - 53) and its double. That must not
+    // reach the distance 1 / (2 * window) between a quotient and a tie.
     constexpr int kBits = 8 * static_cast<int>(sizeof(T));
     if constexpr (kBits <= 16) {
-      shape.floatDivides = (window << kBits) < (std::uint64_t{1} << 23);
+      plan.floatDivides = (window << kBits) < (std::uint64_t{1} << 23);
+      plan.floatMultiplies = (window << kBits) < (std::uint64_t{1} << 22);
     }
-    shape.reciprocal = Reciprocal16::Of(window);
-    return shape;
+    if constexpr (kBits <= 32) {
+      plan.doubleMultiplies = window < (std::uint64_t{1} << (51 - kBits));
+    }
+    return plan;
   }
 
  private:
+  static constexpr std::size_t kNarrowSums = 2048;
+  static constexpr std::size_t kWideSums = 1024;
+  static constexpr std::size_t kStripTaps = 16;
+
   static SumType SumTypeFor(std::size_t bytes, std::uint64_t window) {
     if (bytes == 1 && window * 0xFF <= 0xFFFF) return SumType::kUInt16;
     if (bytes == 1 && window * 0xFF <= 0x7FFFFFFF) return SumType::kInt32;
@@ -100,74 +107,71 @@ struct AverageShape {
 
 /// Scratch of one band, cut from a single allocation. Every row is padded, and long enough for the
 /// widest accumulator.
-template <typename Stored>
+template <typename T>
 struct AverageScratch {
-  AverageShape shape;
-  WindowRow<Stored>* window;  ///< `slots` rows, the newest last
+  WindowRow<T>* ring;   ///< `taps` + 1 rows
+  const T** ordered;    ///< the rows of the window, from the top
+  std::uint8_t* clean;  ///< a row without flags
+  std::size_t pitch;    ///< elements from one row of shared sums to the next
   std::byte* columns;
   std::byte* excludedColumns;
-  std::byte* powers;
-  std::byte* sums;
+  std::byte* levels;  ///< rows of shared sums
   std::byte* counts;
-  Stored* means;
-  Stored* centre;
-  Stored* old;
-  Stored* pattern;
+  T* means;
+  T* centre;
+  T* old;
+  T* bounds;
   std::uint8_t* bytes;
 
-  static std::size_t Bytes(const AverageShape& shape) {
+  static std::size_t Bytes(const AveragePlan& plan) {
     std::size_t size = 0;
-    Layout(shape, nullptr, size);
+    Layout(plan, nullptr, size);
     return size;
   }
-  static AverageScratch Take(const AverageShape& shape, std::byte* memory) {
+  static AverageScratch Take(const AveragePlan& plan, std::byte* memory) {
     std::size_t size = 0;
-    return Layout(shape, memory, size);
-  }
-
-  template <typename Acc>
-  Acc* Row(std::byte* row) const {
-    return reinterpret_cast<Acc*>(row);
+    AverageScratch scratch = Layout(plan, memory, size);
+    std::fill_n(scratch.clean, plan.Pixels() + kRowPadding, std::uint8_t{0});
+    return scratch;
   }
 
  private:
   static constexpr std::size_t kAlignment = 64;
 
-  static std::size_t Aligned(std::size_t bytes) {
-    return (bytes + kAlignment - 1) / kAlignment * kAlignment;
-  }
-  static std::size_t RowBytes(std::size_t elements, std::size_t size) {
-    return Aligned((elements + kRowPadding) * size);
-  }
-
-  static AverageScratch Layout(const AverageShape& shape, std::byte* memory, std::size_t& size) {
+  static AverageScratch Layout(const AveragePlan& plan, std::byte* memory, std::size_t& size) {
     const auto take = [&](std::size_t bytes) {
       std::byte* const place = memory == nullptr ? nullptr : memory + size;
-      size += Aligned(bytes);
+      size += (bytes + kAlignment - 1) / kAlignment * kAlignment;
       return place;
     };
     const auto row = [&](std::size_t elements, std::size_t elementSize) {
-      return take(RowBytes(elements, elementSize));
+      return take((elements + kRowPadding) * elementSize);
     };
+    const auto samples = [&](std::size_t elements) {
+      return reinterpret_cast<T*>(row(elements, sizeof(T)));
+    };
+    const auto flags = [&] { return reinterpret_cast<std::uint8_t*>(row(plan.Pixels(), 1)); };
     constexpr std::size_t kWidest = sizeof(double);
     AverageScratch s{};
-    s.shape = shape;
-    s.window = reinterpret_cast<WindowRow<Stored>*>(take(shape.slots * sizeof(WindowRow<Stored>)));
-    for (std::size_t slot = 0; slot < shape.slots; ++slot) {
-      auto* const samples = reinterpret_cast<Stored*>(row(shape.samples, sizeof(Stored)));
-      auto* const flags = reinterpret_cast<std::uint8_t*>(row(shape.pixels, 1));
-      if (memory != nullptr) s.window[slot] = {samples, flags, {}, false};
+    const std::size_t slots = plan.taps + 1;
+    s.ring = reinterpret_cast<WindowRow<T>*>(take(slots * sizeof(WindowRow<T>)));
+    for (std::size_t slot = 0; slot < slots; ++slot) {
+      T* const ownSamples = samples(plan.Samples());
+      std::uint8_t* const ownFlags = flags();
+      if (memory != nullptr) s.ring[slot] = {ownSamples, ownFlags, ownSamples, ownFlags, {}, false};
     }
-    s.columns = row(shape.samples, kWidest);
-    s.excludedColumns = row(shape.pixels, kWidest);
-    s.powers = row(shape.samples, kWidest);
-    s.sums = row(shape.outputs, kWidest);
-    s.counts = row(shape.outputs, kWidest);
-    s.means = reinterpret_cast<Stored*>(row(shape.outputs, sizeof(Stored)));
-    s.centre = reinterpret_cast<Stored*>(row(shape.outputs, sizeof(Stored)));
-    s.old = reinterpret_cast<Stored*>(row(shape.outputs, sizeof(Stored)));
-    s.pattern = reinterpret_cast<Stored*>(row(4 * (shape.channels + kRowPadding), sizeof(Stored)));
-    s.bytes = reinterpret_cast<std::uint8_t*>(row(shape.pixels, 1));
+    s.ordered = reinterpret_cast<const T**>(take(plan.taps * sizeof(T*)));
+    s.clean = flags();
+    s.columns = row(plan.Samples(), kWidest);
+    s.excludedColumns = row(plan.Pixels(), kWidest);
+    s.pitch = plan.Samples() + kRowPadding;
+    s.levels = take((SharedLevels(plan.taps) + 1) * s.pitch * kWidest);
+    s.counts = row(plan.Outputs(), kWidest);
+    s.means = samples(plan.Outputs());
+    s.centre = samples(plan.Outputs());
+    s.old = samples(plan.Outputs());
+    s.bounds = samples(4 * (plan.channels + kRowPadding));
+    s.bytes = flags();
     return s;
   }
 };
@@ -182,17 +186,15 @@ struct BoundPattern {
   const T* replacement = nullptr;
   std::size_t channels = 1;
   bool active = false;  ///< whether any mean can be changed at all
-  bool avoids = false;
+  bool uniform = true;  ///< whether all channels have the same constants
 
   /// `memory` has room for 4 * (channels + kRowPadding) samples.
-  template <typename Stored>
-  static BoundPattern Of(const AverageJob<T>& job, Stored* memory) {
-    static_assert(sizeof(Stored) == sizeof(T));
+  static BoundPattern Of(const AverageJob<T>& job, T* memory) {
     BoundPattern pattern;
     pattern.channels = job.converters.size();
     if (pattern.channels == 0) return pattern;
     const std::size_t length = pattern.channels + kRowPadding;
-    T* const low = reinterpret_cast<T*>(memory);
+    T* const low = memory;
     T* const high = low + length;
     T* const noData = high + length;
     T* const replacement = noData + length;
@@ -201,13 +203,18 @@ struct BoundPattern {
       const OutputConverter<T>& converter = job.converters[i % pattern.channels];
       low[i] = converter.low();
       high[i] = converter.high();
-      noData[i] = converter.avoids() || !std::is_floating_point_v<T> ? converter.noData()
-                                                                     : Limits::quiet_NaN();
-      replacement[i] = converter.avoids() ? converter.replacement() : noData[i];
+      if (converter.avoids()) {
+        noData[i] = converter.noData();
+        replacement[i] = converter.replacement();
+      } else {
+        noData[i] = replacement[i] = std::is_floating_point_v<T> ? Limits::quiet_NaN() : low[i];
+      }
       // Means of floating samples leave the bounds when a sample is infinite.
       pattern.active = pattern.active || std::is_floating_point_v<T> || converter.avoids() ||
                        low[i] != Limits::lowest() || high[i] != Limits::max();
-      pattern.avoids = pattern.avoids || converter.avoids();
+      pattern.uniform = pattern.uniform && low[i] == low[0] && high[i] == high[0] &&
+                        converter.avoids() == job.converters[0].avoids() &&
+                        (!converter.avoids() || noData[i] == noData[0]);
     }
     pattern.low = low;
     pattern.high = high;

@@ -5,18 +5,29 @@
 #include <bit>
 #include <cstddef>
 #include <cstdint>
+#include <limits>
+#include <type_traits>
 
 namespace zarn::processes::filters {
 
-/// The widest vector.
-inline constexpr std::size_t kVectorBytes = 64;
-
 /// Elements past the end of a padded row that a vector kernel may touch: four channels of the
 /// widest vector of bytes.
-inline constexpr std::size_t kRowPadding = 4 * kVectorBytes;
+inline constexpr std::size_t kRowPadding = 4 * 64;
 
-/// Up to here a window sum simply adds its terms; beyond, doubling takes fewer additions.
+/// Up to here a window sum simply adds its terms; beyond, sums of several terms are shared.
 inline constexpr std::size_t kDirectTaps = 9;
+
+/// Levels of shared sums, four times as many terms in each as in the one below, for windows of
+/// `taps` terms.
+constexpr std::size_t SharedLevels(std::size_t taps) {
+  std::size_t levels = 0;
+  if (taps <= kDirectTaps) return levels;
+  for (; taps >= 4; taps /= 4) ++levels;
+  return levels;
+}
+
+/// Terms of a window sum at the most: three of each level for a 64-bit number of taps.
+inline constexpr std::size_t kMaxTerms = 3 * 32;
 
 /// The binary digits that the samples of a row use: all are multiples of 2^low and smaller in
 /// magnitude than 2^(high + 1). Sums of such numbers are exact in double, in whatever order they
@@ -67,13 +78,25 @@ struct RowRange {
   }
 };
 
-/// A padded copy of one input row.
-template <typename Stored>
+/// One input row of a window: the input itself where that is possible, else a padded copy.
+template <typename T>
 struct WindowRow {
-  Stored* samples;      ///< excluded pixels are zero
-  std::uint8_t* flags;  ///< per pixel: 1 when excluded
-  RowRange range;       ///< of the samples
-  bool dirty;           ///< whether any pixel is excluded
+  const T* samples;           ///< excluded pixels hold `kNeutralSample`
+  const std::uint8_t* flags;  ///< per pixel: 1 when excluded
+  T* ownSamples;              ///< where a copy goes
+  std::uint8_t* ownFlags;
+  RowRange range;  ///< of the samples
+  bool dirty;      ///< whether any pixel is excluded
 };
+
+/// Samples of up to 16 bits are summed as unsigned ones, with their top bit toggled where they are
+/// signed: a constant shift of all samples shifts their mean by as much, and an even one keeps the
+/// ties.
+template <typename T>
+inline constexpr bool kSumsShifted = std::is_integral_v<T>&& std::is_signed_v<T> && sizeof(T) <= 2;
+
+/// The sample that adds nothing to a sum.
+template <typename T>
+inline constexpr T kNeutralSample = kSumsShifted<T> ? std::numeric_limits<T>::min() : T{0};
 
 }  // namespace zarn::processes::filters

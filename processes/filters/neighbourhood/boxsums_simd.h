@@ -3,8 +3,8 @@
 // Row kernels of the square-window filters, compiled once per vector target. Include it only from a
 // `_simd.cpp` that Highway's foreach_target.h compiles repeatedly, after hwy/highway.h.
 //
-// Rows are padded copies: every kernel may read and write up to kRowPadding elements past the
-// length that it is given, so none has a scalar tail.
+// Rows are padded: every kernel may read up to kRowPadding elements past the length that it is
+// given, and write as many past the end of scratch rows, so none has a scalar tail.
 
 #if defined(ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H_) == defined(HWY_TARGET_TOGGLE)
 #ifdef ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H_
@@ -15,6 +15,7 @@
 
 #include <hwy/highway.h>
 
+#include <algorithm>
 #include <bit>
 #include <cstddef>
 #include <cstdint>
@@ -29,22 +30,36 @@ namespace zarn::processes::filters::HWY_NAMESPACE {
 
 namespace hn = hwy::HWY_NAMESPACE;
 
-/// Loads samples as lanes of the accumulator type.
+/// Converts lanes to a wider type; up to 16 bits to double go by way of 32.
+template <class D, class V>
+HWY_INLINE hn::Vec<D> Widen([[maybe_unused]] D d, V v) {
+  using From = hn::TFromV<V>;
+  if constexpr (std::is_same_v<From, hn::TFromD<D>>) {
+    return v;
+  } else if constexpr (std::is_same_v<hn::TFromD<D>, double> && sizeof(From) < 4) {
+    return hn::PromoteTo(d, hn::PromoteTo(hn::Rebind<std::int32_t, D>(), v));
+  } else {
+    return hn::PromoteTo(d, v);
+  }
+}
+
+/// Loads samples as lanes of the accumulator type, small signed ones shifted (see kSumsShifted).
 template <class D, typename T>
 HWY_INLINE hn::Vec<D> LoadAs(D d, const T* from) {
   using Acc = hn::TFromD<D>;
-  const hn::Rebind<T, D> dt;
-  const auto v = hn::LoadU(dt, from);
-  if constexpr (std::is_same_v<T, Acc>) {
-    return v;
-  } else if constexpr (std::is_same_v<Acc, double> && sizeof(T) < 4) {
-    return hn::PromoteTo(d, hn::PromoteTo(hn::Rebind<std::int32_t, D>(), v));
+  if constexpr (kSumsShifted<T>) {
+    using Bits = std::make_unsigned_t<T>;
+    const hn::Rebind<Bits, D> db;
+    const auto top = hn::Set(db, static_cast<Bits>(Bits{1} << (8 * sizeof(T) - 1)));
+    const auto v = hn::Xor(hn::LoadU(db, reinterpret_cast<const Bits*>(from)), top);
+    return Widen(d, v);
   } else if constexpr (std::is_same_v<Acc, double> && std::is_same_v<T, std::uint32_t>) {
+    const hn::Rebind<T, D> dt;
     const hn::Rebind<std::int32_t, D> di;
-    const auto shifted = hn::BitCast(di, hn::Xor(v, hn::Set(dt, 0x80000000U)));
+    const auto shifted = hn::BitCast(di, hn::Xor(hn::LoadU(dt, from), hn::Set(dt, 0x80000000U)));
     return hn::Add(hn::PromoteTo(d, shifted), hn::Set(d, 2147483648.0));
   } else {
-    return hn::PromoteTo(d, v);
+    return Widen(d, hn::LoadU(hn::Rebind<T, D>(), from));
   }
 }
 
@@ -78,102 +93,157 @@ HWY_INLINE void StoreFlags([[maybe_unused]] D d, hn::Mask<D> mask, std::uint8_t*
   }
 }
 
-/// The pixels whose channels all equal `value`, for a vector of pixels.
-template <class D, typename T>
-HWY_INLINE hn::Mask<D> EqualPixels(D d, const T* row, std::size_t channels, const T* value) {
-  if (channels == 1) return hn::Eq(hn::LoadU(d, row), hn::Set(d, value[0]));
-  hn::Vec<D> a, b, c;
-  hn::LoadInterleaved3(d, row, a, b, c);
-  return hn::And(hn::And(hn::Eq(a, hn::Set(d, value[0])), hn::Eq(b, hn::Set(d, value[1]))),
-                 hn::Eq(c, hn::Set(d, value[2])));
-}
+/// Whether vectors of pixels can be compared at once.
+constexpr bool HasPixelVectors(std::size_t channels) { return channels == 1 || channels == 3; }
 
-/// Flags the pixels of a row that are excluded: mask byte 0, no-data or background. Null pointers
-/// switch a reason off. Returns whether any pixel is flagged.
+/// A vector of pixels of one or three channels.
+template <class D>
+struct PixelVectors {
+  template <typename T>
+  HWY_INLINE PixelVectors(D tag, const T* from, std::size_t channels) : d(tag), count(channels) {
+    if (channels == 1) {
+      a = b = c = hn::LoadU(d, from);
+    } else {
+      hn::LoadInterleaved3(d, from, a, b, c);
+    }
+  }
+
+  /// The pixels whose channels all equal `value`.
+  template <typename T>
+  HWY_INLINE hn::Mask<D> Equal(const T* value) const {
+    const auto first = hn::Eq(a, hn::Set(d, value[0]));
+    if (count == 1) return first;
+    const auto second = hn::Eq(b, hn::Set(d, value[1]));
+    return hn::And(hn::And(first, second), hn::Eq(c, hn::Set(d, value[2])));
+  }
+
+  template <typename T>
+  HWY_INLINE void Store(T* to) const {
+    if (count == 1) {
+      hn::StoreU(a, d, to);
+    } else {
+      hn::StoreInterleaved3(a, b, c, d, to);
+    }
+  }
+
+  D d;
+  std::size_t count;
+  hn::Vec<D> a, b, c;
+};
+
+/// The reasons for which a pixel of a row is excluded; null pointers switch a reason off.
 template <typename T>
-HWY_ATTR bool FlagExcluded(const T* row, std::size_t pixels, std::size_t channels, const T* noData,
-                           const T* background, const std::uint8_t* mask, std::uint8_t* flags) {
+struct ExclusionTests {
+  const T* noData;
+  const T* background;
+  const std::uint8_t* mask;  ///< of the row
+
+  bool Any() const { return noData != nullptr || background != nullptr || mask != nullptr; }
+
+  bool Excludes(const T* row, std::size_t channels, std::size_t i) const {
+    const T* const pixel = row + i * channels;
+    return (mask != nullptr && mask[i] == 0) ||
+           (noData != nullptr && PixelEquals(pixel, noData, channels)) ||
+           (background != nullptr && PixelEquals(pixel, background, channels));
+  }
+
+  /// For the pixels from i on.
+  template <class D>
+  HWY_INLINE hn::Mask<D> ExcludesVector(D d, const PixelVectors<D>& pixels, std::size_t i) const {
+    auto excluded = hn::MaskFromVec(hn::Zero(d));
+    if (noData != nullptr) excluded = pixels.Equal(noData);
+    if (background != nullptr) excluded = hn::Or(excluded, pixels.Equal(background));
+    if (mask != nullptr) excluded = hn::Or(excluded, hn::Not(LoadFlags(d, mask + i)));
+    return excluded;
+  }
+};
+
+/// Whether any sample equals the first channel's value: a cheap necessary condition for a pixel to
+/// equal the values of all channels.
+template <typename T>
+HWY_ATTR bool AnySampleEquals(const T* row, std::size_t samples, const T* values) {
   const hn::ScalableTag<T> d;
   const std::size_t lanes = hn::Lanes(d);
-  if (channels != 1 && channels != 3) {
-    std::uint8_t any = 0;
-    for (std::size_t i = 0; i < pixels; ++i) {
-      const T* const pixel = row + i * channels;
-      const bool excluded = (mask != nullptr && mask[i] == 0) ||
-                            (noData != nullptr && PixelEquals(pixel, noData, channels)) ||
-                            (background != nullptr && PixelEquals(pixel, background, channels));
-      flags[i] = excluded ? 1 : 0;
-      any |= flags[i];
-    }
-    return any != 0;
-  }
-  const auto never = hn::MaskFromVec(hn::Zero(d));
-  auto any = never;
-  for (std::size_t i = 0; i < pixels; i += lanes) {
-    auto excluded = never;
-    if (noData != nullptr) excluded = EqualPixels(d, row + i * channels, channels, noData);
-    if (background != nullptr) {
-      excluded = hn::Or(excluded, EqualPixels(d, row + i * channels, channels, background));
-    }
-    if (mask != nullptr) excluded = hn::Or(excluded, hn::Not(LoadFlags(d, mask + i)));
-    StoreFlags(d, excluded, flags + i);
-    // The last vector may reach into the padding, whose content does not count.
-    if (i + lanes > pixels) return !hn::AllFalse(d, any) || std::memchr(flags + i, 1, pixels - i);
-    any = hn::Or(any, excluded);
-  }
-  return !hn::AllFalse(d, any);
+  const auto value = hn::Set(d, values[0]);
+  auto any = hn::MaskFromVec(hn::Zero(d));
+  std::size_t i = 0;
+  for (; i + lanes <= samples; i += lanes) any = hn::Or(any, hn::Eq(hn::LoadU(d, row + i), value));
+  const auto rest = hn::And(hn::Eq(hn::LoadU(d, row + i), value), hn::FirstN(d, samples - i));
+  return !hn::AllFalse(d, hn::Or(any, rest));
 }
 
-/// Zeroes the samples of flagged pixels.
+/// Whether any pixel of a row is excluded.
 template <typename T>
-HWY_ATTR void ZeroFlagged(T* row, std::size_t pixels, std::size_t channels,
-                          const std::uint8_t* flags) {
-  if (channels == 1) {
+HWY_ATTR bool AnyExcluded(const T* row, std::size_t pixels, std::size_t channels,
+                          const ExclusionTests<T>& tests) {
+  if (channels > 1 && tests.mask == nullptr &&
+      (tests.noData == nullptr || !AnySampleEquals(row, pixels * channels, tests.noData)) &&
+      (tests.background == nullptr || !AnySampleEquals(row, pixels * channels, tests.background))) {
+    return false;
+  }
+  std::size_t i = 0;
+  if (HasPixelVectors(channels)) {
     const hn::ScalableTag<T> d;
-    for (std::size_t i = 0; i < pixels; i += hn::Lanes(d)) {
-      const auto kept = hn::IfThenZeroElse(LoadFlags(d, flags + i), hn::LoadU(d, row + i));
-      hn::StoreU(kept, d, row + i);
+    const auto excludes = [&] HWY_ATTR {
+      const PixelVectors<hn::ScalableTag<T>> vectors(d, row + i * channels, channels);
+      return tests.ExcludesVector(d, vectors, i);
+    };
+    for (; i + hn::Lanes(d) <= pixels; i += hn::Lanes(d)) {
+      if (!hn::AllFalse(d, excludes())) return true;
     }
-  } else if (channels == 3) {
+    // What lies beyond the row does not count.
+    return !hn::AllFalse(d, hn::And(excludes(), hn::FirstN(d, pixels - i)));
+  }
+  for (; i < pixels; ++i) {
+    if (tests.Excludes(row, channels, i)) return true;
+  }
+  return false;
+}
+
+/// Copies a row, perhaps onto itself, with the samples of excluded pixels made neutral, and flags
+/// these pixels.
+template <typename T>
+HWY_ATTR void CopyUnexcluded(const T* row, std::size_t pixels, std::size_t channels,
+                             const ExclusionTests<T>& tests, T* to, std::uint8_t* flags) {
+  if (HasPixelVectors(channels)) {
     const hn::ScalableTag<T> d;
+    const auto neutral = hn::Set(d, kNeutralSample<T>);
     for (std::size_t i = 0; i < pixels; i += hn::Lanes(d)) {
-      hn::Vec<decltype(d)> a, b, c;
-      hn::LoadInterleaved3(d, row + 3 * i, a, b, c);
-      const auto flagged = LoadFlags(d, flags + i);
-      hn::StoreInterleaved3(hn::IfThenZeroElse(flagged, a), hn::IfThenZeroElse(flagged, b),
-                            hn::IfThenZeroElse(flagged, c), d, row + 3 * i);
+      PixelVectors<hn::ScalableTag<T>> v(d, row + i * channels, channels);
+      const auto excluded = tests.ExcludesVector(d, v, i);
+      StoreFlags(d, excluded, flags + i);
+      v.a = hn::IfThenElse(excluded, neutral, v.a);
+      v.b = hn::IfThenElse(excluded, neutral, v.b);
+      v.c = hn::IfThenElse(excluded, neutral, v.c);
+      v.Store(to + i * channels);
     }
   } else {
     for (std::size_t i = 0; i < pixels; ++i) {
-      if (flags[i] == 0) continue;
-      for (std::size_t c = 0; c < channels; ++c) row[i * channels + c] = T{0};
+      const bool excluded = tests.Excludes(row, channels, i);
+      flags[i] = excluded ? 1 : 0;
+      for (std::size_t c = i * channels; c < (i + 1) * channels; ++c) {
+        to[c] = excluded ? kNeutralSample<T> : row[c];
+      }
     }
-  }
-}
-
-/// Toggles the top bit of every sample: maps a signed type onto the unsigned one in order.
-template <typename T>
-HWY_ATTR void FlipSign(T* row, std::size_t samples) {
-  using Bits = std::make_unsigned_t<T>;
-  const hn::ScalableTag<Bits> d;
-  auto* const bits = reinterpret_cast<Bits*>(row);
-  const auto top = hn::Set(d, static_cast<Bits>(Bits{1} << (8 * sizeof(T) - 1)));
-  for (std::size_t i = 0; i < samples; i += hn::Lanes(d)) {
-    hn::StoreU(hn::Xor(hn::LoadU(d, bits + i), top), d, bits + i);
   }
 }
 
 /// The binary digits that the row uses.
 HWY_ATTR inline RowRange RangeOf(const float* row, std::size_t samples) {
   const hn::ScalableTag<std::uint32_t> d;
-  const auto one = hn::Set(d, 1);
+  const std::size_t lanes = hn::Lanes(d);
+  const auto* const bits = reinterpret_cast<const std::uint32_t*>(row);
   auto most = hn::Zero(d);
   auto leastLessOne = hn::Set(d, 0xFFFFFFFFU);  // a zero sample wraps around and never is the least
-  const auto* const bits = reinterpret_cast<const std::uint32_t*>(row);
-  for (std::size_t i = 0; i < samples; i += hn::Lanes(d)) {
-    const auto magnitude = hn::And(hn::LoadU(d, bits + i), hn::Set(d, 0x7FFFFFFFU));
+  const auto include = [&](hn::Vec<decltype(d)> v) HWY_ATTR {
+    const auto magnitude = hn::And(v, hn::Set(d, 0x7FFFFFFFU));
     most = hn::Max(most, magnitude);
-    leastLessOne = hn::Min(leastLessOne, hn::Sub(magnitude, one));
+    leastLessOne = hn::Min(leastLessOne, hn::Sub(magnitude, hn::Set(d, 1)));
+  };
+  std::size_t i = 0;
+  for (; i + lanes <= samples; i += lanes) include(hn::LoadU(d, bits + i));
+  if (i < samples) {
+    include(hn::IfThenElseZero(hn::FirstN(d, samples - i), hn::LoadU(d, bits + i)));
   }
   const std::uint32_t high = hn::GetLane(hn::MaxOfLanes(d, most));
   const std::uint32_t low = hn::GetLane(hn::MinOfLanes(d, leastLessOne)) + 1;
@@ -213,45 +283,59 @@ HWY_ATTR void SlideColumns(Acc* HWY_RESTRICT columns, const T* HWY_RESTRICT adde
   }
 }
 
-/// sums[i] = columns[i] + columns[i + step] + ... (`taps` terms), for i < count. The order of
-/// summation is free, so the terms must add up exactly in any order.
-/// `powers` is scratch of the columns' length.
+/// A sink that keeps the vectors that it is given.
 template <typename Acc>
-HWY_ATTR void WindowSums(const Acc* HWY_RESTRICT columns, std::size_t taps, std::size_t step,
-                         std::size_t count, Acc* HWY_RESTRICT powers, Acc* HWY_RESTRICT sums) {
+struct Stores {
+  template <class D>
+  HWY_INLINE void operator()(D d, hn::Vec<D> v, std::size_t i) const {
+    hn::StoreU(v, d, to + i);
+  }
+  Acc* to;
+};
+
+/// Hands columns[i] + columns[i + step] + ... (`taps` terms) to `sink(d, sums, i)`, for i < count.
+/// The order of summation is free, so the terms must add up exactly in any order.
+///
+/// Level l holds the sums of 4^l terms; the digits of `taps` to the base of 4 tell how many of each
+/// level make up a window. `levels` is scratch for levels 1, 2, ..., `pitch` elements each.
+template <typename Acc, class Sink>
+HWY_ATTR void WindowSums(const Acc* columns, std::size_t taps, std::size_t step, std::size_t count,
+                         Acc* levels, std::size_t pitch, const Sink& sink) {
   const hn::ScalableTag<Acc> d;
   const std::size_t lanes = hn::Lanes(d);
+  const Acc* terms[kMaxTerms];
+  std::size_t termCount = 0;
   if (taps <= kDirectTaps) {
-    for (std::size_t i = 0; i < count; i += lanes) {
-      auto sum = hn::LoadU(d, columns + i);
-      for (std::size_t t = 1; t < taps; ++t) {
-        sum = hn::Add(sum, hn::LoadU(d, columns + i + t * step));
+    for (; termCount < taps; ++termCount) terms[termCount] = columns + termCount * step;
+  } else {
+    const std::size_t length = count + (taps - 1) * step;
+    const Acc* level = columns;
+    std::size_t covered = 0;
+    for (std::size_t size = 1; size <= taps; size *= 4, levels += pitch) {
+      const std::size_t reach = size * step;
+      for (std::size_t digit = taps / size % 4; digit > 0; --digit, covered += size) {
+        terms[termCount++] = level + covered * step;
       }
-      hn::StoreU(sum, d, sums + i);
+      if (4 * size > taps) break;
+      const std::size_t end = length - (4 * size - 1) * step;
+      for (std::size_t i = 0; i < end; i += lanes) {
+        const Acc* const from = level + i;
+        const auto two = hn::Add(hn::LoadU(d, from), hn::LoadU(d, from + reach));
+        const auto more = hn::Add(hn::LoadU(d, from + 2 * reach), hn::LoadU(d, from + 3 * reach));
+        hn::StoreU(hn::Add(two, more), d, levels + i);
+      }
+      level = levels;
     }
-    return;
   }
-  // By the binary digits of `taps` (an odd number): `powers` holds the sums of 2, 4, 8, ... terms,
-  // and each digit that is set appends one of them to what the lower digits have covered.
-  const std::size_t length = count + (taps - 1) * step;
-  std::size_t covered = 1;
-  const Acc* half = columns;
-  const Acc* head = columns;
-  for (std::size_t size = 2; size <= taps; size *= 2) {
-    const std::size_t reach = size / 2 * step;
-    const std::size_t end = length - (size - 1) * step;
-    for (std::size_t i = 0; i < end; i += lanes) {
-      const auto sum = hn::Add(hn::LoadU(d, half + i), hn::LoadU(d, half + i + reach));
-      hn::StoreU(sum, d, powers + i);
+  for (std::size_t i = 0; i < count; i += 2 * lanes) {
+    auto low = hn::LoadU(d, terms[0] + i);
+    auto high = hn::LoadU(d, terms[0] + i + lanes);
+    for (std::size_t t = 1; t < termCount; ++t) {
+      low = hn::Add(low, hn::LoadU(d, terms[t] + i));
+      high = hn::Add(high, hn::LoadU(d, terms[t] + i + lanes));
     }
-    half = powers;
-    if ((taps & size) == 0) continue;
-    for (std::size_t i = 0; i < count; i += lanes) {
-      const auto sum = hn::Add(hn::LoadU(d, head + i), hn::LoadU(d, powers + i + covered * step));
-      hn::StoreU(sum, d, sums + i);
-    }
-    head = sums;
-    covered += size;
+    sink(d, low, i);
+    sink(d, high, i + lanes);
   }
 }
 
@@ -272,11 +356,11 @@ HWY_ATTR void RepeatForChannels(const Acc* HWY_RESTRICT perPixel, std::size_t pi
   }
 }
 
-/// sums[i]: the window's samples added in double row by row, each row from the left. `rows` are the
-/// window's rows from the top, starting at its left column.
-template <typename T>
-HWY_ATTR void OrderedSums(const WindowRow<T>* rows, std::size_t taps, std::size_t step,
-                          std::size_t count, double* HWY_RESTRICT sums) {
+/// Hands the sums of the windows' samples, added in double row by row and each row from the left,
+/// to `sink(d, sums, i)`. `rows` are the window's rows from the top, starting at its left column.
+template <typename T, class Sink>
+HWY_ATTR void OrderedSums(const T* const* rows, std::size_t taps, std::size_t step,
+                          std::size_t count, const Sink& sink) {
   const hn::ScalableTag<double> d;
   const std::size_t lanes = hn::Lanes(d);
   for (std::size_t i = 0; i < count; i += 4 * lanes) {
@@ -286,7 +370,7 @@ HWY_ATTR void OrderedSums(const WindowRow<T>* rows, std::size_t taps, std::size_
     auto s2 = s0;
     auto s3 = s0;
     for (std::size_t r = 0; r < taps; ++r) {
-      const T* from = rows[r].samples + i;
+      const T* from = rows[r] + i;
       for (std::size_t t = 0; t < taps; ++t, from += step) {
         s0 = hn::Add(s0, LoadAs(d, from));
         s1 = hn::Add(s1, LoadAs(d, from + lanes));
@@ -294,10 +378,10 @@ HWY_ATTR void OrderedSums(const WindowRow<T>* rows, std::size_t taps, std::size_
         s3 = hn::Add(s3, LoadAs(d, from + 3 * lanes));
       }
     }
-    hn::StoreU(s0, d, sums + i);
-    hn::StoreU(s1, d, sums + i + lanes);
-    hn::StoreU(s2, d, sums + i + 2 * lanes);
-    hn::StoreU(s3, d, sums + i + 3 * lanes);
+    sink(d, s0, i);
+    sink(d, s1, i + lanes);
+    sink(d, s2, i + 2 * lanes);
+    sink(d, s3, i + 3 * lanes);
   }
 }
 

@@ -1,0 +1,161 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <omp.h>
+
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+#include <opencv2/core.hpp>
+#include <opencv2/imgproc.hpp>
+#include <random>
+#include <string>
+#include <vector>
+
+#include "bench/support/comparison.h"
+#include "host/gobs/raster.h"
+#include "processes/filters/factories/averagefilterfactory.h"
+
+namespace zarn::bench {
+namespace {
+
+using gobs::NativeDataTypeCode;
+
+constexpr int kNoData = 255;  // as input no-data; the background is 0
+enum class Content { kClean, kHoles };
+
+struct Case {
+  NativeDataTypeCode type;
+  int cvDepth;
+  const char* typeName;
+  std::uint32_t channels;
+  std::uint32_t side;
+  int size;
+  Content content;
+  int threads;
+};
+
+// Samples between 1 and 254; with holes, patches of no-data and single specks make up about 14 %.
+template <typename T>
+void Fill(gobs::Raster& block, Content content) {
+  std::mt19937 random(7);
+  auto* const samples = static_cast<T*>(block.Data());
+  const std::size_t channels = block.Channels();
+  const std::size_t width = block.FullWidth();
+  const std::size_t height = block.FullHeight();
+  for (std::size_t i = 0; i < width * height * channels; ++i) {
+    samples[i] = static_cast<T>(1 + random() % 254);
+  }
+  if (content == Content::kClean) return;
+  const auto exclude = [&](std::size_t x, std::size_t y, int value) {
+    for (std::size_t c = 0; c < channels; ++c) {
+      samples[(y * width + x) * channels + c] = static_cast<T>(value);
+    }
+  };
+  const std::size_t patches = width * height / 8192;
+  for (std::size_t p = 0; p < patches; ++p) {
+    const std::size_t x0 = random() % width;
+    const std::size_t y0 = random() % height;
+    for (std::size_t y = y0; y < std::min(y0 + 34, height); ++y) {
+      for (std::size_t x = x0; x < std::min(x0 + 34, width); ++x) exclude(x, y, kNoData);
+    }
+  }
+  for (std::size_t i = 0; i < width * height / 100; ++i) {
+    exclude(random() % width, random() % height, random() % 2 != 0 ? kNoData : 0);
+  }
+}
+
+void FillBlock(gobs::Raster& block, Content content) {
+  switch (gobs::GetDataTypeCode(block)) {
+    case NativeDataTypeCode::kUInt8:
+      return Fill<std::uint8_t>(block, content);
+    case NativeDataTypeCode::kUInt16:
+      return Fill<std::uint16_t>(block, content);
+    case NativeDataTypeCode::kFloat32:
+      return Fill<float>(block, content);
+    default:
+      std::abort();
+  }
+}
+
+void Register(const Case& c) {
+  struct Fixture {
+    gobs::Raster input;
+    gobs::Raster output;
+    std::unique_ptr<processes::filters::IFilter> filter;
+    cv::Mat full;
+    cv::Mat source;
+    cv::Mat target;
+  };
+  // Built on first use, so that selecting a few cases does not allocate all of them.
+  const auto fixture = [c, cached = std::make_shared<std::unique_ptr<Fixture>>()]() -> Fixture& {
+    if (*cached) return **cached;
+    const auto half = static_cast<std::uint32_t>(c.size / 2);
+    auto f = std::make_unique<Fixture>(
+        Fixture{gobs::Raster(gobs::RasterInfo(c.side, c.side, c.channels, c.type,
+                                              {.marginX = half, .marginY = half})),
+                gobs::Raster(gobs::RasterInfo(c.side, c.side, c.channels, c.type)),
+                nullptr,
+                {},
+                {},
+                {}});
+    FillBlock(f->input, c.content);
+    f->filter.reset(processes::filters::AverageFilterFactory(c.size, 0).GetCPUFilter());
+    const std::vector<double> inputNoData(c.channels, kNoData);
+    const std::vector<double> outputNoData(c.channels, 0);
+    f->filter->SetNoDataValues(&inputNoData, &outputNoData);
+    const int type = CV_MAKETYPE(c.cvDepth, static_cast<int>(c.channels));
+    f->full = cv::Mat(static_cast<int>(f->input.FullHeight()),
+                      static_cast<int>(f->input.FullWidth()), type, f->input.Data());
+    const int margin = static_cast<int>(half);
+    const int side = static_cast<int>(c.side);
+    f->source = f->full(cv::Rect(margin, margin, side, side));
+    f->target = cv::Mat(side, side, type);
+    *cached = std::move(f);
+    return **cached;
+  };
+  const std::string name = std::string("average ") + c.typeName + "x" + std::to_string(c.channels) +
+                           " " + std::to_string(c.side) + " size " + std::to_string(c.size) +
+                           (c.content == Content::kClean ? " clean" : " holes") + " threads " +
+                           std::to_string(c.threads);
+  const std::size_t sampleBytes = gobs::NativeDataType(c.type).Description().BytesPerSample();
+  Compare({name, "boxFilter", std::size_t{c.side} * c.side * c.channels * sampleBytes,
+           [fixture, c] {
+             Fixture& f = fixture();
+             omp_set_num_threads(c.threads);
+             if (!f.filter->Process(f.input, f.output, 0, 0, nullptr).Ok()) std::abort();
+           },
+           [fixture, c] {
+             Fixture& f = fixture();
+             cv::setNumThreads(c.threads);
+             cv::boxFilter(f.source, f.target, -1, cv::Size(c.size, c.size));
+           }});
+}
+
+const bool kRegistered = [] {
+  struct Type {
+    NativeDataTypeCode code;
+    int cvDepth;
+    const char* name;
+  };
+  const int all = omp_get_max_threads();
+  for (const Type& type : {Type{NativeDataTypeCode::kUInt8, CV_8U, "u8"},
+                           Type{NativeDataTypeCode::kUInt16, CV_16U, "u16"},
+                           Type{NativeDataTypeCode::kFloat32, CV_32F, "f32"}}) {
+    for (const std::uint32_t channels : {1U, 3U}) {
+      for (const std::uint32_t side : {1024U, 4096U}) {
+        for (const int size : {3, 5, 7, 15, 31}) {
+          for (const Content content : {Content::kClean, Content::kHoles}) {
+            Register({type.code, type.cvDepth, type.name, channels, side, size, content, 1});
+            if (size == 5 && all > 1) {
+              Register({type.code, type.cvDepth, type.name, channels, side, size, content, all});
+            }
+          }
+        }
+      }
+    }
+  }
+  return true;
+}();
+
+}  // namespace
+}  // namespace zarn::bench
