@@ -153,7 +153,7 @@ class Strip {
     const UniformBounds<T> uniform(bounds_);
     const bool direct = !Centre().dirty && (uniform.active || !bounds_.active);
     const MeanRow<T> row(direct ? out : scratch_.means, scratch_.means, plan_.Outputs(), uniform);
-    const Means<T, Acc> means{plan_, CountExcluded(), row};
+    const Means<T, Acc> means(plan_, CountExcluded(), row);
     if (columnsReady_) {
       WindowSums(Row(scratch_.columns), plan_.taps, plan_.channels, plan_.Outputs(),
                  Row(scratch_.levels), scratch_.pitch, means);

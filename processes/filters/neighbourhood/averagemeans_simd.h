@@ -158,8 +158,8 @@ class MeanRow {
   }
 
  private:
-  T* HWY_RESTRICT row_;
-  T* HWY_RESTRICT spill_;
+  T* row_;
+  T* spill_;
   std::size_t length_;
   UniformBounds<T> bounds_;
 };
@@ -177,91 +177,122 @@ HWY_INLINE bool IsZero(D d, V v) {
 /// Takes the vectors of window sums, one kind per accumulator. The counts of excluded samples are
 /// null where no window has any.
 template <typename T, typename Acc>
-struct Means;
+class Means;
 
 template <typename T>
-struct Means<T, std::uint16_t> {
+class Means<T, std::uint16_t> {
+ public:
+  Means(const AveragePlan& plan, const std::uint8_t* excluded, const MeanRow<T>& row)
+      : by_(plan.reciprocal),
+        window_(static_cast<std::uint16_t>(plan.Window())),
+        excluded_(excluded),
+        row_(row) {}
+
   template <class D>
   HWY_INLINE void operator()(D d, hn::Vec<D> sums, std::size_t i) const {
-    T* const to = row.Place(i, hn::Lanes(d));
-    const auto missing = Missing(d, excluded, i);
-    const auto& by = plan.reciprocal;
-    if (by.exact && (excluded == nullptr || IsZero(d, missing))) {
+    T* const to = row_.Place(i, hn::Lanes(d));
+    const auto missing = Missing(d, excluded_, i);
+    if (by_.exact && (excluded_ == nullptr || IsZero(d, missing))) {
       const hn::Rebind<std::uint8_t, D> d8;
       const auto product =
-          hn::MulHigh(hn::Add(sums, hn::Set(d, by.bias)), hn::Set(d, by.multiplier));
-      row.StoreUnsigned(d8, hn::TruncateTo(d8, hn::ShiftRightSame(product, by.shift)), to);
+          hn::MulHigh(hn::Add(sums, hn::Set(d, by_.bias)), hn::Set(d, by_.multiplier));
+      row_.StoreUnsigned(d8, hn::TruncateTo(d8, hn::ShiftRightSame(product, by_.shift)), to);
       return;
     }
-    const auto counts = hn::Sub(hn::Set(d, static_cast<std::uint16_t>(plan.Window())), missing);
+    const auto counts = hn::Sub(hn::Set(d, window_), missing);
     const hn::Half<D> dh;
     const hn::RepartitionToWide<hn::RebindToSigned<D>> di;
-    row.StoreFloatQuotients(di, hn::PromoteTo(di, hn::LowerHalf(dh, sums)),
-                            hn::PromoteTo(di, hn::LowerHalf(dh, counts)), to);
-    row.StoreFloatQuotients(di, hn::PromoteTo(di, hn::UpperHalf(dh, sums)),
-                            hn::PromoteTo(di, hn::UpperHalf(dh, counts)), to + hn::Lanes(dh));
+    row_.StoreFloatQuotients(di, hn::PromoteTo(di, hn::LowerHalf(dh, sums)),
+                             hn::PromoteTo(di, hn::LowerHalf(dh, counts)), to);
+    row_.StoreFloatQuotients(di, hn::PromoteTo(di, hn::UpperHalf(dh, sums)),
+                             hn::PromoteTo(di, hn::UpperHalf(dh, counts)), to + hn::Lanes(dh));
   }
 
-  const AveragePlan& plan;
-  const CountFor<std::uint16_t>* HWY_RESTRICT excluded;
-  const MeanRow<T>& row;
+ private:
+  Reciprocal16 by_;
+  std::uint16_t window_;
+  const std::uint8_t* excluded_;
+  MeanRow<T> row_;
 };
 
 template <typename T>
-struct Means<T, std::int32_t> {
+class Means<T, std::int32_t> {
+ public:
+  Means(const AveragePlan& plan, const std::uint16_t* excluded, const MeanRow<T>& row)
+      : window_(static_cast<std::int32_t>(plan.Window())),
+        floatMultiplies_(plan.floatMultiplies),
+        floatDivides_(plan.floatDivides),
+        doubleMultiplies_(plan.doubleMultiplies),
+        excluded_(excluded),
+        row_(row) {}
+
   template <class D>
   HWY_INLINE void operator()(D d, hn::Vec<D> sums, std::size_t i) const {
-    T* const to = row.Place(i, hn::Lanes(d));
-    const auto missing = Missing(d, excluded, i);
-    const bool whole = excluded == nullptr || IsZero(d, missing);
-    const auto window = static_cast<std::int32_t>(plan.Window());
-    const auto counts = hn::Sub(hn::Set(d, window), missing);
-    if (whole && plan.floatMultiplies) {
+    T* const to = row_.Place(i, hn::Lanes(d));
+    const auto missing = Missing(d, excluded_, i);
+    const bool whole = excluded_ == nullptr || IsZero(d, missing);
+    const auto counts = hn::Sub(hn::Set(d, window_), missing);
+    if (whole && floatMultiplies_) {
       const hn::RebindToFloat<D> df;
-      const auto factor = hn::Set(df, 1.0F / static_cast<float>(window));
-      row.StoreFloat(d, hn::Mul(hn::ConvertTo(df, sums), factor), to);
-    } else if (plan.floatDivides) {
-      row.StoreFloatQuotients(d, sums, counts, to);
+      const auto factor = hn::Set(df, 1.0F / static_cast<float>(window_));
+      row_.StoreFloat(d, hn::Mul(hn::ConvertTo(df, sums), factor), to);
+    } else if (floatDivides_) {
+      row_.StoreFloatQuotients(d, sums, counts, to);
     } else {
       const hn::Half<D> dh;
-      const hn::RepartitionToWide<hn::RebindToFloat<D>> dd;
-      const auto store = [&](auto s, auto c, T* at) HWY_ATTR {
-        const auto sum = hn::PromoteTo(dd, s);
-        row.StoreDouble(dd,
-                        whole && plan.doubleMultiplies ? hn::Mul(sum, hn::Set(dd, 1.0 / window))
-                                                       : hn::Div(sum, hn::PromoteTo(dd, c)),
-                        at);
-      };
-      store(hn::LowerHalf(dh, sums), hn::LowerHalf(dh, counts), to);
-      store(hn::UpperHalf(dh, sums), hn::UpperHalf(dh, counts), to + hn::Lanes(dh));
+      StoreHalf(hn::LowerHalf(dh, sums), hn::LowerHalf(dh, counts), whole, to);
+      StoreHalf(hn::UpperHalf(dh, sums), hn::UpperHalf(dh, counts), whole, to + hn::Lanes(dh));
     }
   }
 
-  const AveragePlan& plan;
-  const CountFor<std::int32_t>* HWY_RESTRICT excluded;
-  const MeanRow<T>& row;
+ private:
+  // Half a vector, in double precision.
+  template <class V>
+  HWY_INLINE void StoreHalf(V sums, V counts, bool whole, T* to) const {
+    const hn::ScalableTag<double> d;
+    const auto sum = hn::PromoteTo(d, sums);
+    if (whole && doubleMultiplies_) {
+      row_.StoreDouble(d, hn::Mul(sum, hn::Set(d, 1.0 / window_)), to);
+    } else {
+      row_.StoreDouble(d, hn::Div(sum, hn::PromoteTo(d, counts)), to);
+    }
+  }
+
+  std::int32_t window_;
+  bool floatMultiplies_;
+  bool floatDivides_;
+  bool doubleMultiplies_;
+  const std::uint16_t* excluded_;
+  MeanRow<T> row_;
 };
 
 template <typename T>
-struct Means<T, double> {
+class Means<T, double> {
+ public:
+  Means(const AveragePlan& plan, const std::uint32_t* excluded, const MeanRow<T>& row)
+      : window_(static_cast<double>(plan.Window())),
+        doubleMultiplies_(plan.doubleMultiplies),
+        excluded_(excluded),
+        row_(row) {}
+
   template <class D>
   HWY_INLINE void operator()(D d, hn::Vec<D> sums, std::size_t i) const {
-    T* const to = row.Place(i, hn::Lanes(d));
-    const auto window = static_cast<double>(plan.Window());
-    const auto missing = Missing(d, excluded, i);
-    const bool whole = excluded == nullptr || IsZero(d, missing);
+    T* const to = row_.Place(i, hn::Lanes(d));
+    const auto missing = Missing(d, excluded_, i);
+    const bool whole = excluded_ == nullptr || IsZero(d, missing);
     if (whole && !std::is_same_v<T, double>) {
-      const auto product = hn::Mul(sums, hn::Set(d, 1.0 / window));
-      if (std::is_same_v<T, float> ? NarrowsSafely(d, product) : plan.doubleMultiplies) {
-        row.StoreDouble(d, product, to);
+      const auto product = hn::Mul(sums, hn::Set(d, 1.0 / window_));
+      if (std::is_same_v<T, float> ? NarrowsSafely(d, product) : doubleMultiplies_) {
+        row_.StoreDouble(d, product, to);
         return;
       }
     }
-    row.StoreDouble(d, hn::Div(sums, hn::Sub(hn::Set(d, window), missing)), to);
+    row_.StoreDouble(d, hn::Div(sums, hn::Sub(hn::Set(d, window_), missing)), to);
   }
 
-  /// The product differs from the quotient by no more than two units in the last place. That can
-  /// change the float only where a midpoint of two floats is as near, or below the normal floats.
+ private:
+  // The product differs from the quotient by no more than two units in the last place. That can
+  // change the float only where a midpoint of two floats is as near, or below the normal floats.
   template <class D>
   static HWY_INLINE bool NarrowsSafely(D d, hn::Vec<D> product) {
     const hn::RebindToUnsigned<D> du;
@@ -273,9 +304,10 @@ struct Means<T, double> {
     return hn::AllFalse(d, hn::Or(hn::RebindMask(d, near), tiny));
   }
 
-  const AveragePlan& plan;
-  const CountFor<double>* HWY_RESTRICT excluded;
-  const MeanRow<T>& row;
+  double window_;
+  bool doubleMultiplies_;
+  const std::uint32_t* excluded_;
+  MeanRow<T> row_;
 };
 
 /// Bounds a row of means whose channels have constants of their own.

@@ -175,7 +175,7 @@ HWY_ATTR bool AnySampleEquals(const T* row, std::size_t samples, const T* values
 /// Whether any pixel of a row is excluded.
 template <typename T>
 HWY_ATTR bool AnyExcluded(const T* row, std::size_t pixels, std::size_t channels,
-                          const ExclusionTests<T>& tests) {
+                          ExclusionTests<T> tests) {
   if (channels > 1 && tests.mask == nullptr &&
       (tests.noData == nullptr || !AnySampleEquals(row, pixels * channels, tests.noData)) &&
       (tests.background == nullptr || !AnySampleEquals(row, pixels * channels, tests.background))) {
@@ -204,7 +204,7 @@ HWY_ATTR bool AnyExcluded(const T* row, std::size_t pixels, std::size_t channels
 /// these pixels.
 template <typename T>
 HWY_ATTR void CopyUnexcluded(const T* row, std::size_t pixels, std::size_t channels,
-                             const ExclusionTests<T>& tests, T* to, std::uint8_t* flags) {
+                             ExclusionTests<T> tests, T* to, std::uint8_t* flags) {
   if (HasPixelVectors(channels)) {
     const hn::ScalableTag<T> d;
     const auto neutral = hn::Set(d, kNeutralSample<T>);
@@ -293,6 +293,28 @@ struct Stores {
   Acc* to;
 };
 
+/// Hands terms[0][i] + terms[1][i] + ... to `sink(d, sums, i)`, for i < count. `kTerms` is the
+/// number of terms where it is worth a loop of its own, else 0.
+template <std::size_t kTerms, typename Acc, class Sink>
+HWY_ATTR void SumTerms(const Acc* const* terms, std::size_t termCount, std::size_t count,
+                       Sink sink) {
+  const hn::ScalableTag<Acc> d;
+  const std::size_t lanes = hn::Lanes(d);
+  const Acc* from[kTerms == 0 ? kMaxTerms : kTerms];
+  const std::size_t n = kTerms == 0 ? termCount : kTerms;
+  for (std::size_t t = 0; t < n; ++t) from[t] = terms[t];
+  for (std::size_t i = 0; i < count; i += 2 * lanes) {
+    auto low = hn::LoadU(d, from[0] + i);
+    auto high = hn::LoadU(d, from[0] + i + lanes);
+    for (std::size_t t = 1; t < n; ++t) {
+      low = hn::Add(low, hn::LoadU(d, from[t] + i));
+      high = hn::Add(high, hn::LoadU(d, from[t] + i + lanes));
+    }
+    sink(d, low, i);
+    sink(d, high, i + lanes);
+  }
+}
+
 /// Hands columns[i] + columns[i + step] + ... (`taps` terms) to `sink(d, sums, i)`, for i < count.
 /// The order of summation is free, so the terms must add up exactly in any order.
 ///
@@ -300,7 +322,7 @@ struct Stores {
 /// level make up a window. `levels` is scratch for levels 1, 2, ..., `pitch` elements each.
 template <typename Acc, class Sink>
 HWY_ATTR void WindowSums(const Acc* columns, std::size_t taps, std::size_t step, std::size_t count,
-                         Acc* levels, std::size_t pitch, const Sink& sink) {
+                         Acc* levels, std::size_t pitch, Sink sink) {
   const hn::ScalableTag<Acc> d;
   const std::size_t lanes = hn::Lanes(d);
   const Acc* terms[kMaxTerms];
@@ -327,15 +349,15 @@ HWY_ATTR void WindowSums(const Acc* columns, std::size_t taps, std::size_t step,
       level = levels;
     }
   }
-  for (std::size_t i = 0; i < count; i += 2 * lanes) {
-    auto low = hn::LoadU(d, terms[0] + i);
-    auto high = hn::LoadU(d, terms[0] + i + lanes);
-    for (std::size_t t = 1; t < termCount; ++t) {
-      low = hn::Add(low, hn::LoadU(d, terms[t] + i));
-      high = hn::Add(high, hn::LoadU(d, terms[t] + i + lanes));
-    }
-    sink(d, low, i);
-    sink(d, high, i + lanes);
+  switch (termCount) {
+    case 3:
+      return SumTerms<3>(terms, termCount, count, sink);
+    case 5:
+      return SumTerms<5>(terms, termCount, count, sink);
+    case 7:
+      return SumTerms<7>(terms, termCount, count, sink);
+    default:
+      return SumTerms<0>(terms, termCount, count, sink);
   }
 }
 
@@ -360,7 +382,7 @@ HWY_ATTR void RepeatForChannels(const Acc* HWY_RESTRICT perPixel, std::size_t pi
 /// to `sink(d, sums, i)`. `rows` are the window's rows from the top, starting at its left column.
 template <typename T, class Sink>
 HWY_ATTR void OrderedSums(const T* const* rows, std::size_t taps, std::size_t step,
-                          std::size_t count, const Sink& sink) {
+                          std::size_t count, Sink sink) {
   const hn::ScalableTag<double> d;
   const std::size_t lanes = hn::Lanes(d);
   for (std::size_t i = 0; i < count; i += 4 * lanes) {
