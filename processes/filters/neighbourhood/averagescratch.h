@@ -93,8 +93,8 @@ struct AveragePlan {
   }
 
  private:
-  static constexpr std::size_t kNarrowSums = 2048;
-  static constexpr std::size_t kWideSums = 1024;
+  static constexpr std::size_t kNarrowSums = 4096;
+  static constexpr std::size_t kWideSums = 2048;
   static constexpr std::size_t kStripTaps = 16;
 
   static SumType SumTypeFor(std::size_t bytes, std::uint64_t window) {
