@@ -1,0 +1,11 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace zarn::app {
+
+/// Adds the command `average` to the program.
+void AddAverageCommand(CLI::App& app);
+
+}  // namespace zarn::app

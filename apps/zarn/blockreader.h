@@ -1,0 +1,55 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "apps/zarn/dataset.h"
+#include "apps/zarn/maskfile.h"
+#include "apps/zarn/nodata.h"
+#include "apps/zarn/windowbuffers.h"
+#include "apps/zarn/windows.h"
+
+namespace zarn::app {
+
+/// Reads windows with their halo and finds out which pixels are to be processed.
+///
+/// Not processed are pixels outside of the image, those that the file declares invalid (NaN in a
+/// band, alpha 0, mask 0) and those that a mask file excludes. Their output is prepared here,
+/// because filters leave it alone: a copy of the input, or the output no-data value where that was
+/// asked for and the file declares the pixel invalid. No-data values are the filters' own business.
+class BlockReader {
+ public:
+  /// `mask` may be null.
+  BlockReader(const RasterSource& source, MaskFile* mask, const NoDataValues& noData,
+              std::int64_t halo);
+
+  /// Bytes of a pixel of the channels.
+  std::size_t SampleBytes() const { return sampleBytes_; }
+  /// Bytes of what is read and computed beside a pixel.
+  std::size_t SideBytes() const;
+
+  /// Fills all planes of `buffers`. `above` holds the window above, where it is still in memory;
+  /// the rows that the two share are taken from there. Throws `RunError`.
+  void Read(const Window& window, const WindowBuffers* above, WindowBuffers& buffers);
+
+ private:
+  struct Fresh;  // the part of a window that has to be read
+
+  void Shape(const Window& window, WindowBuffers& buffers) const;
+  void ReadBands(const Fresh& fresh, const std::vector<int>& bands, Plane& plane);
+  void ReadFileMask(const Fresh& fresh, Plane& plane);
+  void MarkValid(const Fresh& fresh, WindowBuffers& buffers);
+  void PrepareOutput(WindowBuffers& buffers) const;
+
+  const RasterSource& source_;
+  MaskFile* mask_;
+  const NoDataValues& noData_;
+  std::int64_t halo_;
+  std::size_t sampleBytes_;
+  bool isFloat_;
+  bool needsValid_;
+  std::vector<std::uint8_t> maskScratch_;
+};
+
+}  // namespace zarn::app

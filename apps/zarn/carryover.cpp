@@ -1,0 +1,88 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/carryover.h"
+
+#include <cpl_string.h>
+
+#include <algorithm>
+#include <functional>
+#include <sstream>
+
+namespace zarn::app {
+namespace {
+
+void CopyGeoreference(GDALDataset& source, GDALDataset& output) {
+  if (source.GetGCPCount() > 0) {
+    output.SetGCPs(source.GetGCPCount(), source.GetGCPs(), source.GetGCPSpatialRef());
+  }
+  if (source.GetSpatialRef() != nullptr) output.SetSpatialRef(source.GetSpatialRef());
+  double transform[6];
+  if (source.GetGeoTransform(transform) == CE_None) output.SetGeoTransform(transform);
+}
+
+void CopyMetadata(GDALDataset& source, GDALDataset& output) {
+  CPLStringList general(CSLDuplicate(source.GetMetadata()));
+  general.SetNameValue("NODATA_VALUES", nullptr);
+  if (!general.empty()) output.SetMetadata(general.List());
+  for (const char* const domain : {"RPC", "GEOLOCATION"}) {
+    char** const items = source.GetMetadata(domain);
+    if (items != nullptr) output.SetMetadata(items, domain);
+  }
+}
+
+// Statistics describe the pixels before the filter.
+CPLStringList WithoutStatistics(char** items) {
+  CPLStringList kept;
+  for (; items != nullptr && *items != nullptr; ++items) {
+    if (!STARTS_WITH_CI(*items, "STATISTICS_")) kept.AddString(*items);
+  }
+  return kept;
+}
+
+void CopyBand(GDALRasterBand& source, GDALRasterBand& output) {
+  if (source.GetDescription()[0] != '\0') output.SetDescription(source.GetDescription());
+  const GDALColorInterp colour = source.GetColorInterpretation();
+  if (colour != GCI_Undefined && colour != output.GetColorInterpretation()) {
+    output.SetColorInterpretation(colour);
+  }
+  CPLStringList items = WithoutStatistics(source.GetMetadata());
+  if (!items.empty()) output.SetMetadata(items.List());
+  int has = FALSE;
+  const double offset = source.GetOffset(&has);
+  if (has != FALSE && offset != 0) output.SetOffset(offset);
+  const double scale = source.GetScale(&has);
+  if (has != FALSE && scale != 1) output.SetScale(scale);
+  if (source.GetUnitType()[0] != '\0') output.SetUnitType(source.GetUnitType());
+}
+
+void DeclareNoData(const RasterSource& source, const std::vector<double>& values,
+                   GDALDataset& output) {
+  if (values.empty()) return;
+  const bool equal =
+      std::adjacent_find(values.begin(), values.end(), std::not_equal_to<>()) == values.end();
+  if (equal || values.size() == 1) {
+    for (const int number : source.Channels()) {
+      output.GetRasterBand(number)->SetNoDataValue(values.front());
+    }
+    return;
+  }
+  // Most formats have one value for all bands; this item has one for each and means, like the
+  // filters, the pixel as a whole.
+  std::ostringstream list;
+  list.precision(17);
+  for (const double value : values) list << (&value == values.data() ? "" : " ") << value;
+  output.SetMetadataItem("NODATA_VALUES", list.str().c_str());
+}
+
+}  // namespace
+
+void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output) {
+  for (int number = 1; number <= output.GetRasterCount(); ++number) {
+    CopyBand(*source.Dataset().GetRasterBand(number), *output.GetRasterBand(number));
+  }
+  CopyMetadata(source.Dataset(), output);
+  CopyGeoreference(source.Dataset(), output);
+  DeclareNoData(source, noData, output);
+  if (!source.Masks().empty()) output.CreateMaskBand(GMF_PER_DATASET);
+}
+
+}  // namespace zarn::app

@@ -1,0 +1,70 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <signal.h>
+
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <cstdio>
+#include <exception>
+#include <new>
+#include <string>
+
+#include "apps/zarn/average.h"
+#include "apps/zarn/errors.h"
+#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/interruption.h"
+#include "apps/zarn/sample.h"
+
+namespace {
+
+constexpr int kRunFailed = 1;
+constexpr int kWrongUsage = 2;
+
+int Fail(int status, std::string text) {
+  std::replace(text.begin(), text.end(), '\n', ' ');
+  std::fprintf(stderr, "zarn: %s\n", text.c_str());
+  return status;
+}
+
+std::string CommandOf(const CLI::App& app) {
+  const auto parsed = app.get_subcommands();
+  return parsed.empty() ? "zarn" : "zarn " + parsed.front()->get_name();
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  zarn::app::HandleInterruptions();
+  // A file that grows past a limit is to end in an error message, not in a killed process.
+  signal(SIGXFSZ, SIG_IGN);
+
+  CLI::App app("Filters rasters of any size, in the manner of the GDAL tools.", "zarn");
+  app.set_version_flag("--version", "zarn " ZARN_VERSION);
+  app.require_subcommand(1);
+  app.footer(
+      "'zarn COMMAND --help' shows the options of a command.\n\n"
+      "Example:\n  zarn average --size 5 scene.tif smooth.tif");
+  zarn::app::AddAverageCommand(app);
+  zarn::app::AddSampleCommand(app);
+
+  // Whatever escapes a thread still must not leave half an output behind.
+  std::set_terminate([] { zarn::app::AbandonAndExit("stopped by an internal error"); });
+
+  const zarn::app::GdalSession gdal;
+  try {
+    app.parse(argc, argv);
+    return 0;
+  } catch (const CLI::ParseError& error) {
+    if (error.get_exit_code() == 0) return app.exit(error);
+    const bool unknownCommand = app.get_subcommands().empty() && app.remaining_size() > 0;
+    const std::string reason = unknownCommand
+                                   ? "there is no command '" + app.remaining().front() + "'"
+                                   : std::string(error.what());
+    return Fail(kWrongUsage, reason + " (see " + CommandOf(app) + " --help)");
+  } catch (const zarn::app::UsageError& error) {
+    return Fail(kWrongUsage, error.what());
+  } catch (const std::bad_alloc&) {
+    return Fail(kRunFailed, "out of memory; try a smaller --memory or --size");
+  } catch (const std::exception& error) {
+    return Fail(kRunFailed, error.what());
+  }
+}

@@ -1,0 +1,42 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "apps/zarn/stagedoutput.h"
+#include "processes/filters/framework/ifilter.h"
+
+namespace zarn::app {
+
+/// What the commands of the square-window filters share: `zarn <command> [options] IN OUT`.
+struct NeighbourhoodOptions {
+  std::string input;
+  OutputOptions output;
+  std::int64_t size = 3;
+  std::string background;
+  std::string srcNoData;
+  std::string dstNoData;
+  std::string mask;
+  std::string window;
+  std::int64_t memory = 256;  ///< MiB
+  int threads = 0;            ///< 0: all
+  bool quiet = false;
+};
+
+/// Declares the options on a subcommand.
+void AddNeighbourhoodOptions(CLI::App& command, NeighbourhoodOptions& options);
+
+/// Makes a filter for a window of `size` pixels a side, with a background value or none.
+using NeighbourhoodFilterMaker = std::function<std::unique_ptr<processes::filters::IFilter>(
+    int size, std::optional<double> background)>;
+
+/// Filters the input file into the output file. Throws `UsageError` and `RunError`.
+void RunNeighbourhoodFilter(const NeighbourhoodOptions& options,
+                            const NeighbourhoodFilterMaker& makeFilter);
+
+}  // namespace zarn::app

@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/nodata.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstddef>
+#include <cstdlib>
+#include <sstream>
+#include <string>
+
+#include "apps/zarn/errors.h"
+#include "apps/zarn/gdalsession.h"
+#include "host/gobs/datatypeadapter.h"
+
+namespace zarn::app {
+namespace {
+
+std::string ToText(double value) {
+  std::ostringstream text;
+  text.precision(17);
+  text << value;
+  return text.str();
+}
+
+std::vector<double> OnePerChannel(const RasterSource& source, const std::string& option,
+                                  const std::vector<double>& values) {
+  const std::size_t channels = source.Channels().size();
+  if (values.size() == 1) return std::vector<double>(channels, values.front());
+  if (values.empty() || values.size() == channels) return values;
+  throw UsageError(option + " has " + std::to_string(values.size()) + " values, but " +
+                   source.Name() + " has " + std::to_string(channels) + " bands" +
+                   (source.Alphas().empty() ? "" : " besides alpha") +
+                   "; give one value or one per band");
+}
+
+// The list, or none when a value can never occur: no pixel can then equal it in all channels.
+std::vector<double> Holdable(const RasterSource& source, const std::string& origin,
+                             std::vector<double> values) {
+  for (const double value : values) {
+    if (CanHold(source.Type().code, value)) continue;
+    Warn(origin + " " + ToText(value) + " cannot occur in " + source.Type().Name() +
+         " samples and is taken as none");
+    return {};
+  }
+  return values;
+}
+
+}  // namespace
+
+double ParseNumber(const std::string& option, const std::string& text) {
+  char* end = nullptr;
+  const double value = std::strtod(text.c_str(), &end);
+  if (end == text.c_str() || *end != '\0') {
+    throw UsageError(option + ": '" + text + "' is not a number");
+  }
+  return value;
+}
+
+std::optional<std::vector<double>> ParseNoData(const std::string& option, const std::string& text) {
+  if (text.empty()) return std::nullopt;
+  std::vector<double> values;
+  if (text == "none") return values;
+  for (std::size_t begin = 0; begin <= text.size();) {
+    const std::size_t end = std::min(text.find(',', begin), text.size());
+    values.push_back(ParseNumber(option, text.substr(begin, end - begin)));
+    begin = end + 1;
+  }
+  return values;
+}
+
+bool CanHold(gobs::NativeDataTypeCode code, double value) {
+  using enum gobs::NativeDataTypeCode;
+  // Half a step beyond the largest float still rounds to it.
+  constexpr double kPastLargestFloat = 0x1.ffffffp+127;
+  if (code == kFloat64) return true;
+  if (code == kFloat32) return !std::isfinite(value) || std::abs(value) < kPastLargestFloat;
+  return value == std::trunc(value) && value >= gobs::DataTypeAdapter::MinValue(code) &&
+         value <= gobs::DataTypeAdapter::MaxValue(code);
+}
+
+NoDataValues ResolveNoData(const RasterSource& source, const std::string& srcOption,
+                           const std::string& dstOption) {
+  NoDataValues result;
+  const auto src = ParseNoData("--src-nodata", srcOption);
+  const auto dst = ParseNoData("--dst-nodata", dstOption);
+  result.input = src ? Holdable(source, "--src-nodata", OnePerChannel(source, "--src-nodata", *src))
+                     : Holdable(source, source.Name() + ": no-data value", source.NoData());
+  result.output = result.input;
+  if (dst) {
+    result.output = Holdable(source, "--dst-nodata", OnePerChannel(source, "--dst-nodata", *dst));
+    result.translate = !result.output.empty();
+  }
+  return result;
+}
+
+}  // namespace zarn::app

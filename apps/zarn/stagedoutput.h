@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <gdal_priv.h>
+
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "apps/zarn/dataset.h"
+#include "apps/zarn/outputformat.h"
+#include "apps/zarn/stagingfolder.h"
+#include "host/nspio/counter.h"
+
+namespace zarn::app {
+
+struct OutputOptions {
+  std::string target;
+  std::string format;                 ///< a GDAL driver name; empty: by the target's extension
+  std::vector<std::string> creation;  ///< KEY=VALUE
+  bool overwrite = false;
+};
+
+/// An output raster with the size and bands of a source. It is written in a temporary place and
+/// appears at its target, whole, with `Publish`; destroyed before that it leaves no trace.
+class StagedOutput {
+ public:
+  /// Throws `UsageError` when the target is one of the source's own files, `RunError` when it
+  /// cannot be written.
+  StagedOutput(const OutputOptions& options, const RasterSource& like,
+               const std::vector<double>& noData);
+
+  /// The raster to write to.
+  GDALDataset& Dataset() { return *dataset_; }
+  std::string Name() const { return staging_.Target().string(); }
+
+  /// Whether `Publish` still has the larger part of the writing to do.
+  bool CopiesAtTheEnd() const { return !format_.WritesBlocks(); }
+
+  /// Completes the file (copies it, for formats that cannot be written by blocks) and moves it to
+  /// its target. Throws `RunError` when anything was not written.
+  void Publish(nspio::Counter& progress);
+
+ private:
+  void Create(const RasterSource& like);
+  void CopyToFormat(nspio::Counter& progress);
+
+  OutputFormat format_;
+  StagingFolder staging_;
+  CPLStringList options_;
+  DatasetPtr dataset_;
+};
+
+/// Throws `RunError` "cannot write ..." with GDAL's reason, or the full disk where that is why.
+[[noreturn]] void FailWriting(const std::string& name, const std::string& reason);
+
+}  // namespace zarn::app

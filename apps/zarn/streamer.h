@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+
+#include "apps/zarn/blockreader.h"
+#include "apps/zarn/blockwriter.h"
+#include "apps/zarn/windows.h"
+#include "host/gobs/raster.h"
+#include "host/nspio/counter.h"
+
+namespace zarn::app {
+
+/// Windows that are in memory at a time: one being read, one filtered and one written.
+inline constexpr std::size_t kStreamSlots = 3;
+
+/// Filters one window: `input` has the margins that were planned for, `output` holds what pixels
+/// become that are left alone, `mask` is null or covers the input with its margins.
+using BlockFunction =
+    std::function<void(const gobs::Raster& input, gobs::Raster& output, const std::uint8_t* mask)>;
+
+/// Takes all windows of `plan` through reader, `filter` and writer, which overlap. `filter` runs on
+/// the calling thread. The first exception of any of them is rethrown.
+void StreamWindows(const RasterSource& source, const WindowPlan& plan, BlockReader& reader,
+                   const BlockFunction& filter, BlockWriter& writer, nspio::Counter& progress);
+
+/// Sizes GDAL's block cache for the reading pattern of `plan`: a row of the file's blocks that lies
+/// across two windows has to stay until the lower one is read.
+void FitBlockCache(const RasterSource& source, const WindowPlan& plan, std::int64_t halo);
+
+}  // namespace zarn::app

@@ -1,0 +1,180 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "tests/apps/zarn/image.h"
+#include "tests/apps/zarn/program.h"
+
+namespace zarn::testsupport {
+namespace {
+
+namespace fs = std::filesystem;
+using Arguments = std::vector<std::string>;
+
+void ExpectOneLine(const Outcome& outcome, int status, const std::string& part) {
+  EXPECT_EQ(outcome.status, status);
+  EXPECT_TRUE(outcome.err.starts_with("zarn: ")) << outcome.err;
+  EXPECT_EQ(std::count(outcome.err.begin(), outcome.err.end(), '\n'), 1) << outcome.err;
+  EXPECT_NE(outcome.err.find(part), std::string::npos)
+      << "'" << part << "' is not in: " << outcome.err;
+  EXPECT_EQ(outcome.out, "");
+}
+
+// One of everything that can be wrong with an input.
+void WriteInputs(const TemporaryFolder& folder) {
+  Write(NoiseImage(60, 40, 3, GDT_Byte, {}, 1), folder / "good.tif");
+  Write(NoiseImage(61, 40, 1, GDT_Byte, {}, 1), folder / "mask61.tif");
+  Write(NoiseImage(60, 40, 1, GDT_Byte, {}, 1), folder / "moved.tif", {}, [](GDALDataset& dataset) {
+    double transform[6] = {1000, 1, 0, 0, 0, -1};
+    dataset.SetGeoTransform(transform);
+  });
+  Write(NoiseImage(60, 40, 1, GDT_Byte, {}, 1), folder / "placed.tif", {},
+        [](GDALDataset& dataset) {
+          double transform[6] = {0, 1, 0, 0, 0, -1};
+          dataset.SetGeoTransform(transform);
+        });
+  Write(Image(6, 4, 1, GDT_CFloat32), folder / "complex.tif");
+  Write(Image(6, 4, 1, GDT_Int64), folder / "int64.tif");
+  Write(Image(6, 4, 1, GDT_Byte), folder / "palette.tif", {}, [](GDALDataset& dataset) {
+    GDALColorTable table;
+    const GDALColorEntry red{255, 0, 0, 255};
+    table.SetColorEntry(1, &red);
+    dataset.GetRasterBand(1)->SetColorTable(&table);
+  });
+  Write(NoiseImage(600, 400, 1, GDT_Byte, {}, 1), folder / "cut.tif", {"TILED=YES"});
+  fs::resize_file(folder / "cut.tif", 200000);
+  std::ofstream(folder / "text.tif") << "not a raster";
+  std::ofstream(folder / "mixed.vrt")
+      << "<VRTDataset rasterXSize='4' rasterYSize='4'><VRTRasterBand dataType='Byte' band='1'/>"
+         "<VRTRasterBand dataType='Int16' band='2'/></VRTDataset>";
+  std::ofstream(folder / "existing.tif") << "precious";
+}
+
+TEST(WrongInput, EndsInOneLineAndLeavesNothing) {
+  const TemporaryFolder folder;
+  WriteInputs(folder);
+  const std::set<std::string> before = folder.Names();
+  const std::string good = folder / "good.tif";
+  const std::string out = folder / "out.tif";
+  struct Case {
+    Arguments arguments;  ///< after "average"
+    int status;
+    std::string message;
+  };
+  const std::vector<Case> cases{
+      {{folder / "missing.tif", out}, 1, "missing.tif: No such file"},
+      {{folder / "text.tif", out}, 1, "not recognized"},
+      {{folder / "cut.tif", out}, 1, "cannot read"},
+      {{folder / "complex.tif", out},
+       1,
+       "band 1 is CFloat32: Unknown raster block data type for average filter."},
+      {{folder / "int64.tif", out},
+       1,
+       "band 1 is Int64: Unknown raster block data type for average filter."},
+      {{folder / "mixed.vrt", out}, 1, "band 1 is Byte, band 2 is Int16"},
+      {{folder / "palette.tif", out}, 1, "-expand rgb"},
+      {{good, folder / "existing.tif"}, 1, "--overwrite"},
+      {{good, folder / "nowhere/out.tif"}, 1, "there is no folder"},
+      {{"--overwrite", good, folder / "."}, 1, "not a regular file"},
+      {{"--overwrite", good, good}, 2, "name another output"},
+      {{"--mask", folder / "mask61.tif", good, out}, 1, "61 x 40"},
+      {{"--mask", good, good, out}, 1, "3 bands"},
+      {{"--mask", folder / "moved.tif", folder / "placed.tif", out}, 1, "elsewhere"},
+      {{"--mask", folder / "missing.tif", good, out}, 1, "missing.tif"},
+      {{"--overwrite", "--mask", folder / "placed.tif", good, folder / "placed.tif"},
+       2,
+       "is the mask file"},
+      {{"--size", "abc", good, out}, 2, "'abc'"},
+      {{"--size", "0", good, out}, 2, "at least 1"},
+      {{"--size", "-3", good, out}, 2, "at least 1"},
+      {{"--size", "2.5", good, out}, 2, "'2.5'"},
+      {{"--size", "", good, out}, 2, "--size"},
+      {{"--src-nodata", "1,2", good, out}, 2, "has 2 values, but"},
+      {{"--dst-nodata", "1,2,3,4", good, out}, 2, "has 3 bands"},
+      {{"--src-nodata", "water", good, out}, 2, "'water'"},
+      {{"--background", "1,2,3", good, out}, 2, "--background"},
+      {{"--window", "7", good, out}, 2, "COLSxROWS"},
+      {{"--window", "0x7", good, out}, 2, "COLSxROWS"},
+      {{"--threads", "-1", good, out}, 2, "--threads"},
+      {{"--of", "NOSUCH", good, out}, 2, "NOSUCH"},
+      {{"--of", "VRT", good, out}, 2, "VRT"},
+      {{good, folder / "out.vrt"}, 2, "VRT"},
+      {{"--of", "PNG", folder / "complex.tif", out}, 1, "CFloat32"},
+      {{"--co", "COMPRESS", good, out}, 2, "KEY=VALUE"},
+      {{"--co", "COMPRES=LZW", good, out}, 2, "COMPRES"},
+      {{"--memory", "1", "--size", "5001", folder / "cut.tif", out}, 1, "--memory"},
+      {{good}, 2, "OUT is required"},
+      {{}, 2, "IN is required"},
+      {{good, out, out}, 2, "not expected"},
+      {{"--sise", "3", good, out}, 2, "--sise"},
+  };
+  for (const Case& c : cases) {
+    Arguments arguments{"average"};
+    arguments.insert(arguments.end(), c.arguments.begin(), c.arguments.end());
+    std::string line;
+    for (const std::string& argument : arguments) line += argument + " ";
+    SCOPED_TRACE(line);
+    ExpectOneLine(RunProgram(arguments), c.status, c.message);
+    EXPECT_EQ(folder.Names(), before);
+  }
+  ExpectOneLine(RunProgram({}), 2, "--help");
+  ExpectOneLine(RunProgram({"avrage", good, out}), 2, "no command 'avrage'");
+  EXPECT_EQ(fs::file_size(folder / "existing.tif"), 8U);
+}
+
+TEST(WrongInput, HelpAndVersionSucceed) {
+  EXPECT_EQ(RunProgram({"--version"}).out.substr(0, 5), "zarn ");
+  const Outcome help = RunProgram({"average", "--help"});
+  EXPECT_EQ(help.status, 0);
+  EXPECT_NE(help.out.find("zarn average --size 5 "), std::string::npos) << help.out;
+}
+
+TEST(FullDisk, IsReportedAndLeavesTheExistingOutput) {
+  const TemporaryFolder folder;
+  Write(NoiseImage(700, 500, 1, GDT_Float32, {}, 1), folder / "in.tif");
+  for (const Arguments& format :
+       std::vector<Arguments>{{}, {"--co", "COMPRESS=NONE"}, {"--of", "COG"}, {"--of", "ENVI"}}) {
+    std::ofstream(folder / "out.tif") << "precious";
+    Arguments arguments{"average", "--overwrite", folder / "in.tif", folder / "out.tif"};
+    arguments.insert(arguments.begin() + 1, format.begin(), format.end());
+    SCOPED_TRACE(format.empty() ? "default" : format.back());
+    ExpectOneLine(RunProgram(arguments, 100000), 1, "cannot write");
+    EXPECT_EQ(folder.Names(), (std::set<std::string>{"in.tif", "out.tif"}));
+    EXPECT_EQ(fs::file_size(folder / "out.tif"), 8U);
+  }
+}
+
+TEST(Interruption, LeavesNothingAndKeepsTheExistingOutput) {
+  const TemporaryFolder folder;
+  // Empty tiles take no space in the input, but keep the program busy for long enough.
+  GDALAllRegister();
+  const char* const sparse[] = {"SPARSE_OK=TRUE", "TILED=YES", "BIGTIFF=YES", nullptr};
+  OpenDataset(GetGDALDriverManager()->GetDriverByName("GTiff")->Create(
+      (folder / "in.tif").c_str(), 100000, 100000, 1, GDT_Byte, const_cast<char**>(sparse)));
+  for (const int number : {SIGINT, SIGTERM}) {
+    std::ofstream(folder / "out.tif") << "precious";
+    Program program({"average", "--overwrite", folder / "in.tif", folder / "out.tif"});
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(20);
+    while (folder.Names().size() < 3 && std::chrono::steady_clock::now() < deadline) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    ASSERT_EQ(folder.Names().size(), 3U) << "the program writes beside its output";
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+    program.Signal(number);
+    ExpectOneLine(program.Wait(), 1, "interrupted");
+    EXPECT_EQ(folder.Names(), (std::set<std::string>{"in.tif", "out.tif"}));
+    EXPECT_EQ(fs::file_size(folder / "out.tif"), 8U);
+  }
+}
+
+}  // namespace
+}  // namespace zarn::testsupport
