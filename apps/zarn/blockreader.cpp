@@ -182,21 +182,28 @@ void BlockReader::ReadBands(const Fresh& fresh, const std::vector<int>& bands, P
 void BlockReader::ReadFileMask(const Fresh& fresh, Plane& plane) {
   if (!plane.Used()) return;
   fresh.ClearOutside(plane);
-  const int width = static_cast<int>(fresh.inside.width);
-  maskScratch_.resize(static_cast<std::size_t>(width));
-  CPLErrorReset();
-  for (std::int64_t y = 0; y < fresh.inside.height; ++y) {
-    auto* const row = reinterpret_cast<std::uint8_t*>(plane.At(fresh.column, fresh.row + y));
-    std::fill_n(row, width, std::uint8_t{255});
-    for (GDALRasterBand* const mask : source_.Masks()) {
-      if (mask->RasterIO(GF_Read, static_cast<int>(fresh.inside.x),
-                         static_cast<int>(fresh.inside.y + y), width, 1, maskScratch_.data(), width,
-                         1, GDT_Byte, 0, 0, nullptr) != CE_None) {
-        throw RunError("cannot read the mask of " + source_.Name() + ": " +
-                       LastGdalMessage(source_.Name()));
-      }
-      std::transform(row, row + width, maskScratch_.data(), row,
-                     [](std::uint8_t a, std::uint8_t b) { return std::min(a, b); });
+  const auto read = [&](GDALRasterBand& mask, std::int64_t y, std::int64_t height, void* rows) {
+    const int width = static_cast<int>(fresh.inside.width);
+    CPLErrorReset();
+    if (mask.RasterIO(GF_Read, static_cast<int>(fresh.inside.x),
+                      static_cast<int>(fresh.inside.y + y), width, static_cast<int>(height), rows,
+                      width, static_cast<int>(height), GDT_Byte, 1,
+                      static_cast<GSpacing>(plane.Stride()), nullptr) != CE_None) {
+      throw RunError("cannot read the mask of " + source_.Name() + ": " +
+                     LastGdalMessage(source_.Name()));
+    }
+  };
+  if (fresh.inside.height > 0) {
+    read(*source_.Masks().front(), 0, fresh.inside.height, plane.At(fresh.column, fresh.row));
+  }
+  // Further masks belong to further bands; a pixel is valid where all of them say so.
+  maskScratch_.resize(static_cast<std::size_t>(fresh.inside.width));
+  for (std::size_t i = 1; i < source_.Masks().size(); ++i) {
+    for (std::int64_t y = 0; y < fresh.inside.height; ++y) {
+      read(*source_.Masks()[i], y, 1, maskScratch_.data());
+      std::byte* const row = plane.At(fresh.column, fresh.row + y);
+      std::transform(maskScratch_.begin(), maskScratch_.end(), row, row,
+                     [](std::byte a, std::byte b) { return std::min(a, b); });
     }
   }
 }

@@ -3,6 +3,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <vector>
 
 #include "apps/zarn/dataset.h"
 #include "apps/zarn/maskfile.h"
@@ -49,7 +50,7 @@ class BlockReader {
   std::size_t sampleBytes_;
   bool isFloat_;
   bool needsValid_;
-  std::vector<std::uint8_t> maskScratch_;
+  std::vector<std::byte> maskScratch_;
 };
 
 }  // namespace zarn::app

@@ -30,14 +30,7 @@ std::string CommandOf(const CLI::App& app) {
   return parsed.empty() ? "zarn" : "zarn " + parsed.front()->get_name();
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
-  zarn::app::HandleInterruptions();
-  // A file that grows past a limit is to end in an error message, not in a killed process.
-  signal(SIGXFSZ, SIG_IGN);
-
-  CLI::App app("Filters rasters of any size, in the manner of the GDAL tools.", "zarn");
+void AddCommands(CLI::App& app) {
   app.set_version_flag("--version", "zarn " ZARN_VERSION);
   app.require_subcommand(1);
   app.footer(
@@ -45,10 +38,11 @@ int main(int argc, char** argv) {
       "Example:\n  zarn average --size 5 scene.tif smooth.tif");
   zarn::app::AddAverageCommand(app);
   zarn::app::AddSampleCommand(app);
+}
 
-  // Whatever escapes a thread still must not leave half an output behind.
-  std::set_terminate([] { zarn::app::AbandonAndExit("stopped by an internal error"); });
-
+int RunCommand(int argc, char** argv) {
+  CLI::App app("Filters rasters of any size, in the manner of the GDAL tools.", "zarn");
+  AddCommands(app);
   const zarn::app::GdalSession gdal;
   try {
     app.parse(argc, argv);
@@ -66,5 +60,21 @@ int main(int argc, char** argv) {
     return Fail(kRunFailed, "out of memory; try a smaller --memory or --size");
   } catch (const std::exception& error) {
     return Fail(kRunFailed, error.what());
+  }
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  try {
+    zarn::app::HandleInterruptions();
+    // A file that grows past a limit is to end in an error message, not in a killed process.
+    signal(SIGXFSZ, SIG_IGN);
+    // Whatever escapes a thread still must not leave half an output behind.
+    std::set_terminate([] { zarn::app::AbandonAndExit("stopped by an internal error"); });
+    return RunCommand(argc, argv);
+  } catch (...) {
+    std::fputs("zarn: stopped by an internal error\n", stderr);
+    return kRunFailed;
   }
 }

@@ -3,6 +3,7 @@
 
 #include <cpl_error.h>
 
+#include <algorithm>
 #include <cmath>
 #include <string>
 
@@ -11,6 +12,8 @@
 
 namespace zarn::app {
 namespace {
+
+constexpr std::int64_t kPartPixels = 1 << 20;  // read at a time
 
 // Whether two rasters of one size cover the same ground, to a tenth of a pixel at every corner.
 bool SamePlace(GDALDataset& a, GDALDataset& b) {
@@ -59,19 +62,38 @@ MaskFile::MaskFile(const std::string& name, const RasterSource& image)
 }
 
 void MaskFile::Exclude(const Window& area, std::uint8_t* valid, std::size_t stride) {
-  row_.resize(static_cast<std::size_t>(area.width));
-  const int width = static_cast<int>(area.width);
-  for (std::int64_t y = 0; y < area.height; ++y) {
-    // As doubles, because a byte would round a mask value of 0.3 to 0.
-    if (dataset_->GetRasterBand(1)->RasterIO(GF_Read, static_cast<int>(area.x),
-                                             static_cast<int>(area.y + y), width, 1, row_.data(),
-                                             width, 1, GDT_Float64, 0, 0, nullptr) != CE_None) {
-      throw RunError("cannot read the mask " + name_ + ": " + LastGdalMessage(name_));
+  // Any other type as doubles, because a byte would round a mask value of 0.3 to 0.
+  const bool bytes = dataset_->GetRasterBand(1)->GetRasterDataType() == GDT_Byte;
+  const std::int64_t rows = std::max<std::int64_t>(1, kPartPixels / area.width);
+  for (std::int64_t y = 0; y < area.height; y += rows) {
+    const Window part{area.x, area.y + y, area.width, std::min(rows, area.height - y)};
+    std::uint8_t* const partValid = valid + static_cast<std::size_t>(y) * stride;
+    if (bytes) {
+      ExcludeRows(part, GDT_Byte, bytes_, partValid, stride);
+    } else {
+      ExcludeRows(part, GDT_Float64, doubles_, partValid, stride);
     }
-    std::uint8_t* const bytes = valid + static_cast<std::size_t>(y) * stride;
-    for (std::size_t x = 0; x < row_.size(); ++x) {
-      const bool processed = row_[x] < 0 || row_[x] > 0;
-      bytes[x] = processed ? bytes[x] : std::uint8_t{0};
+  }
+}
+
+template <typename Sample>
+void MaskFile::ExcludeRows(const Window& part, GDALDataType type, std::vector<Sample>& samples,
+                           std::uint8_t* valid, std::size_t stride) {
+  const auto width = static_cast<std::size_t>(part.width);
+  const auto height = static_cast<std::size_t>(part.height);
+  samples.resize(width * height);
+  CPLErrorReset();
+  if (dataset_->GetRasterBand(1)->RasterIO(
+          GF_Read, static_cast<int>(part.x), static_cast<int>(part.y), static_cast<int>(part.width),
+          static_cast<int>(part.height), samples.data(), static_cast<int>(part.width),
+          static_cast<int>(part.height), type, 0, 0, nullptr) != CE_None) {
+    throw RunError("cannot read the mask " + name_ + ": " + LastGdalMessage(name_));
+  }
+  for (std::size_t y = 0; y < height; ++y) {
+    for (std::size_t x = 0; x < width; ++x) {
+      const Sample sample = samples[y * width + x];
+      const bool processed = sample < Sample{0} || sample > Sample{0};  // not so for NaN
+      valid[y * stride + x] = processed ? valid[y * stride + x] : std::uint8_t{0};
     }
   }
 }

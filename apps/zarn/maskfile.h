@@ -27,9 +27,14 @@ class MaskFile {
   void Exclude(const Window& area, std::uint8_t* valid, std::size_t stride);
 
  private:
+  template <typename Sample>
+  void ExcludeRows(const Window& part, GDALDataType type, std::vector<Sample>& samples,
+                   std::uint8_t* valid, std::size_t stride);
+
   std::string name_;
   DatasetPtr dataset_;
-  std::vector<double> row_;
+  std::vector<std::uint8_t> bytes_;
+  std::vector<double> doubles_;
 };
 
 }  // namespace zarn::app

@@ -99,8 +99,9 @@ struct AveragePlan {
 
   static SumType SumTypeFor(std::size_t bytes, std::uint64_t window) {
     if (bytes == 1 && window * 0xFF <= 0xFFFF) return SumType::kUInt16;
-    if (bytes == 1 && window * 0xFF <= 0x7FFFFFFF) return SumType::kInt32;
-    if (bytes == 2 && window * 0xFFFF <= 0x7FFFFFFF) return SumType::kInt32;
+    // The counts beside the sums have 16 bits.
+    const std::uint64_t most = bytes == 1 ? 0xFF : 0xFFFF;
+    if (bytes <= 2 && window <= 0xFFFF && window * most <= 0x7FFFFFFF) return SumType::kInt32;
     return SumType::kDouble;
   }
 };

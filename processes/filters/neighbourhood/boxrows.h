@@ -12,7 +12,7 @@ namespace zarn::processes::filters {
 
 /// Elements past the end of a padded row that a vector kernel may touch: four channels of the
 /// widest vector of bytes.
-inline constexpr std::size_t kRowPadding = 4 * 64;
+inline constexpr std::size_t kRowPadding = std::size_t{4} * 64;
 
 /// Up to here a window sum simply adds its terms; beyond, sums of several terms are shared.
 inline constexpr std::size_t kDirectTaps = 9;
@@ -27,7 +27,7 @@ constexpr std::size_t SharedLevels(std::size_t taps) {
 }
 
 /// Terms of a window sum at the most: three of each level for a 64-bit number of taps.
-inline constexpr std::size_t kMaxTerms = 3 * 32;
+inline constexpr std::size_t kMaxTerms = std::size_t{3} * 32;
 
 /// The binary digits that the samples of a row use: all are multiples of 2^low and smaller in
 /// magnitude than 2^(high + 1). Sums of such numbers are exact in double, in whatever order they

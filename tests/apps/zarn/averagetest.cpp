@@ -166,7 +166,7 @@ TEST_F(Average, TreatsTransparentPixelsAsInvalidAndCopiesAlpha) {
 
 TEST_F(Average, UsesAndCarriesTheMaskBandOfTheFile) {
   const Image image = NoiseImage(50, 40, 1, GDT_Int16, {}, 4);
-  std::vector<std::uint8_t> mask(50 * 40, 255);
+  std::vector<std::uint8_t> mask(std::size_t{50} * 40, 255);
   for (std::size_t i = 0; i < mask.size(); i += 7) mask[i] = 0;
   WriteInput(image, [&](GDALDataset& dataset) {
     CPLSetThreadLocalConfigOption("GDAL_TIFF_INTERNAL_MASK", "YES");

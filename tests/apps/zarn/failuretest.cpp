@@ -158,7 +158,7 @@ TEST(Interruption, LeavesNothingAndKeepsTheExistingOutput) {
   // Empty tiles take no space in the input, but keep the program busy for long enough.
   GDALAllRegister();
   const char* const sparse[] = {"SPARSE_OK=TRUE", "TILED=YES", "BIGTIFF=YES", nullptr};
-  OpenDataset(GetGDALDriverManager()->GetDriverByName("GTiff")->Create(
+  GDALClose(GetGDALDriverManager()->GetDriverByName("GTiff")->Create(
       (folder / "in.tif").c_str(), 100000, 100000, 1, GDT_Byte, const_cast<char**>(sparse)));
   for (const int number : {SIGINT, SIGTERM}) {
     std::ofstream(folder / "out.tif") << "precious";

@@ -164,23 +164,5 @@ TEST_F(SampleCommand, LeavesExistingFilesAlone) {
   EXPECT_EQ(Contents(root_ / "scene2_u8.tif"), "mine");
 }
 
-TEST_F(SampleCommand, RefusesFoldersThatAreNone) {
-  std::ofstream(root_ / "file") << "mine";
-  for (const char* const name : {"file", "file/below"}) {
-    EXPECT_THROW(RunSample((root_ / name).string()), RunError) << name;
-  }
-  EXPECT_EQ(Contents(root_ / "file"), "mine");
-  EXPECT_EQ(NamesIn(root_), std::set<std::string>{"file"});
-}
-
-TEST_F(SampleCommand, RefusesSeedsThatAreNoNumbers) {
-  for (const char* const seed : {"x", "-1", "1.5", "4294967296"}) {
-    EXPECT_THROW(RunSample("--seed " + std::string(seed) + " " + (root_ / "new").string()),
-                 CLI::ParseError)
-        << seed;
-  }
-  EXPECT_FALSE(fs::exists(root_ / "new"));
-}
-
 }  // namespace
 }  // namespace zarn::app

@@ -4,7 +4,6 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
-#include <type_traits>
 #include <utility>
 #include <vector>
 
@@ -17,25 +16,6 @@ namespace {
 using enum NativeDataTypeCode;
 
 constexpr std::uint32_t kMax = 4294967295U;
-
-TEST(RasterInfo, KeepsItsShapeAndCountsTheMargins) {
-  const BlockFrame frame{.marginX = 3, .marginY = 5, .originX = 70, .originY = 90};
-  const RasterInfo info(20, 10, 3, kUInt16, frame);
-  EXPECT_EQ(info.Width(), 20U);
-  EXPECT_EQ(info.Height(), 10U);
-  EXPECT_EQ(info.Channels(), 3U);
-  EXPECT_EQ(info.MarginX(), 3U);
-  EXPECT_EQ(info.MarginY(), 5U);
-  EXPECT_EQ(info.OriginX(), 70U);
-  EXPECT_EQ(info.OriginY(), 90U);
-  EXPECT_EQ(info.FullWidth(), 26U);
-  EXPECT_EQ(info.FullHeight(), 20U);
-  EXPECT_EQ(info.DescribedSize(), 26U * 20 * 3 * 2);
-}
-
-TEST(RasterInfo, CountsBothComponentsOfComplexSamples) {
-  EXPECT_EQ(RasterInfo(7, 5, 2, kComplexFloat64).DescribedSize(), 7U * 5 * 2 * 16);
-}
 
 struct SizeCase {
   const char* what;
@@ -98,12 +78,6 @@ TEST(Raster, OwnsZeroedMemory) {
   bytes[raster.DataSize() - 1] = 1;
 }
 
-TEST(Raster, OwnsNothingForAnEmptyShape) {
-  const Raster raster(RasterInfo(0, 12, 3, kUInt16));
-  EXPECT_EQ(raster.DataSize(), 0U);
-  EXPECT_EQ(raster.Data(), nullptr);
-}
-
 TEST(Raster, WrapsWithoutACopy) {
   std::vector<std::int16_t> samples(12, 7);
   const RasterInfo info(4, 3, 1, kInt16);
@@ -115,20 +89,6 @@ TEST(Raster, WrapsWithoutACopy) {
     static_cast<std::int16_t*>(raster.Data())[5] = -3;
   }
   EXPECT_EQ(samples[5], -3);
-}
-
-TEST(Raster, WrapsReadOnlyMemory) {
-  static constexpr std::array<std::uint8_t, 4> kSamples = {1, 2, 3, 4};
-  const Raster& raster = Raster::WrapConst(RasterInfo(2, 2, 1, kUInt8), kSamples.data(), 4);
-  static_assert(std::is_same_v<decltype(raster.Data()), const void*>);
-  EXPECT_EQ(raster.Data(), kSamples.data());
-  EXPECT_FALSE(raster.OwnsData());
-}
-
-TEST(Raster, WrapsLessThanDescribedAndReportsWhatIsThere) {
-  std::array<std::uint8_t, 10> few{};
-  EXPECT_EQ(Raster(RasterInfo(100, 1, 1, kUInt8), few.data(), few.size()).DataSize(), 10U);
-  EXPECT_EQ(Raster(RasterInfo(1, 1, 1, kUInt8), nullptr, 0).Data(), nullptr);
 }
 
 TEST(Raster, CapsTheSizeOfWrappedMemoryInsteadOfWrappingIt) {

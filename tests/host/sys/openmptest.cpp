@@ -43,17 +43,6 @@ TEST_F(OpenMPTest, ThreadCountIsKeptWithinWhatThereIsAndRestored) {
   }
 }
 
-TEST_F(OpenMPTest, ThreadCountsNest) {
-  const OMPThreadCount outer(3);
-  {
-    const OMPThreadCount inner(2);
-    EXPECT_EQ(OMPGetMaxThreads(), 2);
-    const OMPThreadCount innermost(4);
-    EXPECT_EQ(OMPGetMaxThreads(), 2);
-  }
-  EXPECT_EQ(OMPGetMaxThreads(), 3);
-}
-
 TEST_F(OpenMPTest, DynamicAdjustmentIsSetAndRestored) {
   for (const int before : {0, 1}) {
     omp_set_dynamic(before);
@@ -64,21 +53,6 @@ TEST_F(OpenMPTest, DynamicAdjustmentIsSetAndRestored) {
     EXPECT_EQ(omp_get_dynamic(), before);
   }
   omp_set_dynamic(0);
-}
-
-TEST_F(OpenMPTest, NumbersTheThreadsOfARegion) {
-  omp_set_dynamic(0);
-  const OMPThreadCount count(3);
-  int seen = 0;
-  int threads = 0;
-#pragma omp parallel reduction(+ : seen) reduction(max : threads)
-  {
-    seen = 1 << (4 * OMPGetThreadNum());
-    threads = OMPGetNumThreads();
-  }
-  EXPECT_EQ(seen, 0x111);
-  EXPECT_EQ(threads, 3);
-  EXPECT_EQ(OMPGetNumThreads(), 1);
 }
 
 }  // namespace

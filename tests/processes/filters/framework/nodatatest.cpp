@@ -47,22 +47,6 @@ TYPED_TEST(NoDataTest, ConvertsListsAndBackgroundsLikeTheReference) {
   EXPECT_TRUE(ConvertNoData<TypeParam>({}).empty());
 }
 
-TEST(ConvertNoData, RoundsHalfAwayFromZeroAndClamps) {
-  const std::vector<double> list = {126.6, -300, -2.5, 2.5, 127.5, -0.5, 0.4};
-  EXPECT_EQ(ConvertNoData<std::int8_t>(list),
-            (std::vector<std::int8_t>{127, -128, -3, 3, 127, -1, 0}));
-  EXPECT_EQ(ConvertNoData<std::uint8_t>(list),
-            (std::vector<std::uint8_t>{127, 0, 0, 3, 128, 0, 0}));
-  EXPECT_EQ(ConvertNoData<float>({0.1, -2.5}), (std::vector<float>{0.1F, -2.5F}));
-}
-
-TEST(TruncateToSample, CutsAndSaturates) {
-  EXPECT_EQ(TruncateToSample<std::uint8_t>(-9999), 0);
-  EXPECT_EQ(TruncateToSample<std::uint8_t>(300), 255);
-  EXPECT_EQ(TruncateToSample<std::int16_t>(-2.9), -2);
-  EXPECT_EQ(TruncateToSample<std::int32_t>(kNaN), 0);
-}
-
 TEST(PixelEquality, LooksAtAllChannels) {
   const std::uint16_t value[] = {10, 20, 30};
   const std::uint16_t same[] = {10, 20, 30};

@@ -153,35 +153,6 @@ TEST(AverageFilter, FollowsTheFloatingRules) {
   EXPECT_FALSE(std::signbit(FilterNine<float>({}, flat)));
 }
 
-TEST(AverageFilter, TakesEvenSizesAsTheNextOddOneAndSmallOnesAsThePixelAlone) {
-  const struct {
-    int kernelSize;
-    std::uint32_t half;
-  } kCases[] = {{-1, 0}, {0, 0}, {1, 0}, {2, 1}, {3, 1}, {4, 2}, {5, 2}};
-  for (const auto& c : kCases) {
-    SCOPED_TRACE(c.kernelSize);
-    TestBlock<std::int32_t> input({.width = 3, .height = 2, .marginX = c.half, .marginY = c.half});
-    TestBlock<std::int32_t> actual({.width = 3, .height = 2});
-    TestBlock<std::int32_t> expected = actual;
-    ASSERT_TRUE(FilterAverage({.kernelSize = c.kernelSize}, input, {}, actual).Ok());
-    const int odd = 2 * static_cast<int>(c.half) + 1;
-    testsupport::ReferenceAverage({.kernelSize = odd}, input, {}, expected);
-    EXPECT_TRUE(SameBlocks(actual, expected));
-    if (c.half == 0) {
-      EXPECT_EQ(actual.At(2, 1), input.At(2, 1));
-    }
-  }
-}
-
-TEST(AverageFilter, AcceptsATallerInputAndWritesNoMargins) {
-  const TestBlock<std::uint16_t> input({.width = 10, .height = 9, .marginX = 2, .marginY = 1});
-  TestBlock<std::uint16_t> actual({.width = 10, .height = 5, .marginX = 3, .marginY = 2});
-  TestBlock<std::uint16_t> expected = actual;
-  ASSERT_TRUE(FilterAverage({}, input, {}, actual).Ok());
-  testsupport::ReferenceAverage({}, input, {}, expected);
-  EXPECT_TRUE(SameBlocks(actual, expected));
-}
-
 TEST(AverageFilter, AcceptsEmptyBlocks) {
   for (const Shape shape :
        {Shape{.width = 0, .height = 5, .marginX = 1, .marginY = 1},
@@ -197,28 +168,6 @@ TEST(AverageFilter, AcceptsEmptyBlocks) {
     EXPECT_EQ(FilterAverage(parameters, input, {}, output).message, "");
     EXPECT_EQ(FilterAverage(parameters, input, mask, output).message, "");
     EXPECT_TRUE(SameBlocks(output, before));
-  }
-}
-
-TEST(AverageFilter, KeepsNothingBetweenBlocks) {
-  const auto filter = testsupport::MakeAverageFilter({.background = 0});
-  const std::vector<double> noData = {41};
-  filter->SetNoDataValues(&noData, nullptr);
-  for (const std::uint32_t width : {30U, 7U, 64U}) {
-    for (const std::uint32_t channels : {1U, 3U}) {
-      if (channels > noData.size()) filter->SetNoDataValues(nullptr, nullptr);
-      const TestBlock<std::uint8_t> input(
-          {.width = width, .height = 4, .channels = channels, .marginX = 1, .marginY = 1});
-      TestBlock<std::uint8_t> actual({.width = width, .height = 4, .channels = channels});
-      TestBlock<std::uint8_t> expected = actual;
-      gobs::Raster target = actual.Wrap();
-      ASSERT_TRUE(filter->Process(input.Wrap(), target, width, channels, nullptr).Ok());
-      AverageParameters parameters{.background = 0};
-      if (channels == 1) parameters.inputNoData = noData;
-      testsupport::ReferenceAverage(parameters, input, {}, expected);
-      EXPECT_TRUE(SameBlocks(actual, expected));
-      filter->SetNoDataValues(&noData, nullptr);
-    }
   }
 }
 
