@@ -10,7 +10,7 @@
 #include <type_traits>
 
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 #include "processes/filters/framework/nodata.h"
 #include "processes/filters/framework/sampletypes.h"
 

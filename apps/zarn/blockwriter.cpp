@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <utility>
 
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/stagedoutput.h"
 
 namespace zarn::app {

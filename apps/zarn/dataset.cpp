@@ -8,7 +8,7 @@
 #include <string>
 
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 
 namespace zarn::app {
 namespace {

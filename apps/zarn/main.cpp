@@ -10,7 +10,7 @@
 
 #include "apps/zarn/average.h"
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/interruption.h"
 #include "apps/zarn/sample.h"
 
@@ -43,7 +43,7 @@ void AddCommands(CLI::App& app) {
 int RunCommand(int argc, char** argv) {
   CLI::App app("Filters rasters of any size, in the manner of the GDAL tools.", "zarn");
   AddCommands(app);
-  const zarn::app::GdalSession gdal;
+  const zarn::app::GdalRuntime gdal;
   try {
     app.parse(argc, argv);
     return 0;

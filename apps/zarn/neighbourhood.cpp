@@ -11,7 +11,7 @@
 #include "apps/zarn/blockwriter.h"
 #include "apps/zarn/dataset.h"
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/maskfile.h"
 #include "apps/zarn/nodata.h"
 #include "apps/zarn/progress.h"

@@ -9,7 +9,7 @@
 #include <string>
 
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 #include "host/gobs/datatypeadapter.h"
 
 namespace zarn::app {

@@ -5,7 +5,7 @@
 #include <cpl_error.h>
 
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 
 namespace zarn::app {
 namespace {

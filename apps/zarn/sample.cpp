@@ -20,7 +20,7 @@
 
 #include "apps/zarn/dataset.h"
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/landscape.h"
 #include "apps/zarn/progress.h"
 #include "apps/zarn/scene.h"

@@ -9,7 +9,7 @@
 
 #include "apps/zarn/carryover.h"
 #include "apps/zarn/errors.h"
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 
 namespace zarn::app {
 namespace fs = std::filesystem;

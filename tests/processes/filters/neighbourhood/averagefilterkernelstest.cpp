@@ -21,7 +21,6 @@ using testsupport::AgreesWithReference;
 using testsupport::AverageParameters;
 using testsupport::FilterAverage;
 using testsupport::RandomNumbers;
-using testsupport::SameBlocks;
 using testsupport::Shape;
 using testsupport::TestBlock;
 

@@ -15,8 +15,6 @@ namespace zarn::processes::filters {
 namespace {
 
 using testsupport::AgreesOnScene;
-using testsupport::FilterAverage;
-using testsupport::TestBlock;
 
 // Threads that a parallel region opened here gets.
 int TeamSize() {
@@ -66,10 +64,11 @@ TEST_F(AverageFilterThreadsTest, SharesTheRowsOutAmongTheThreads) {
     // A thread without regions so far has no team yet.
     std::thread([&] {
       omp_set_num_threads(threads);
-      const TestBlock<std::uint8_t> input({.width = 50, .height = 40, .marginX = 1, .marginY = 1});
-      TestBlock<std::uint8_t> output({.width = 50, .height = 40});
+      const testsupport::TestBlock<std::uint8_t> input(
+          {.width = 50, .height = 40, .marginX = 1, .marginY = 1});
+      testsupport::TestBlock<std::uint8_t> output({.width = 50, .height = 40});
       const auto before = liveThreads();
-      EXPECT_TRUE(FilterAverage({}, input, {}, output).Ok());
+      EXPECT_TRUE(testsupport::FilterAverage({}, input, {}, output).Ok());
       EXPECT_EQ(liveThreads() - before, threads - 1);
     }).join();
   }

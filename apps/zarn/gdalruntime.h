@@ -8,12 +8,12 @@ namespace zarn::app {
 /// Sets GDAL up for the life of the program: drivers, cache, and an error handler that keeps GDAL's
 /// messages from the terminal. Failures are folded into the program's own messages; warnings are
 /// printed as one line each, the same text once.
-class GdalSession {
+class GdalRuntime {
  public:
-  GdalSession();
-  ~GdalSession();
-  GdalSession(const GdalSession&) = delete;
-  GdalSession& operator=(const GdalSession&) = delete;
+  GdalRuntime();
+  ~GdalRuntime();
+  GdalRuntime(const GdalRuntime&) = delete;
+  GdalRuntime& operator=(const GdalRuntime&) = delete;
 };
 
 /// Threads that GDAL may use for compression and decompression; 0 means all.

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "apps/zarn/gdalsession.h"
+#include "apps/zarn/gdalruntime.h"
 
 #include <cpl_conv.h>
 #include <cpl_error.h>
@@ -60,7 +60,7 @@ void CPL_STDCALL HandleGdalMessage(CPLErr level, CPLErrorNum, const char* text) 
 
 }  // namespace
 
-GdalSession::GdalSession() {
+GdalRuntime::GdalRuntime() {
   CPLSetErrorHandler(HandleGdalMessage);
   // The stages hold their own blocks; GDAL's cache only has to bridge partly used tiles.
   if (CPLGetConfigOption("GDAL_CACHEMAX", nullptr) == nullptr) GDALSetCacheMax64(64 << 20);
@@ -69,7 +69,7 @@ GdalSession::GdalSession() {
   GDALAllRegister();
 }
 
-GdalSession::~GdalSession() { CPLSetErrorHandler(CPLDefaultErrorHandler); }
+GdalRuntime::~GdalRuntime() { CPLSetErrorHandler(CPLDefaultErrorHandler); }
 
 void SetGdalThreads(int threads) {
   CPLSetConfigOption("GDAL_NUM_THREADS",
