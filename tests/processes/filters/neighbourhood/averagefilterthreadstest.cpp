@@ -4,11 +4,10 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <filesystem>
-#include <iterator>
 #include <thread>
 #include <vector>
 
+#include "processes/filters/framework/parallel.h"
 #include "tests/support/averagefiltering.h"
 
 namespace zarn::processes::filters {
@@ -53,26 +52,22 @@ TEST_F(AverageFilterThreadsTest, GivesTheSameBitsForEveryThreadCount) {
 }
 
 TEST_F(AverageFilterThreadsTest, SharesTheRowsOutAmongTheThreads) {
-#if defined(__clang__) || !defined(__linux__)
-  GTEST_SKIP() << "counts the threads that GNU's run-time starts for a new master thread";
-#else
-  const auto liveThreads = [] {
-    using std::filesystem::directory_iterator;
-    return std::distance(directory_iterator("/proc/self/task"), directory_iterator());
-  };
   for (const int threads : {1, 2, 3}) {
-    // A thread without regions so far has no team yet.
-    std::thread([&] {
-      omp_set_num_threads(threads);
-      const testsupport::TestBlock<std::uint8_t> input(
-          {.width = 50, .height = 40, .marginX = 1, .marginY = 1});
-      testsupport::TestBlock<std::uint8_t> output({.width = 50, .height = 40});
-      const auto before = liveThreads();
-      EXPECT_TRUE(testsupport::FilterAverage({}, input, {}, output).Ok());
-      EXPECT_EQ(liveThreads() - before, threads - 1);
-    }).join();
+    omp_set_num_threads(threads);
+    const std::ptrdiff_t bands = parallel::BandCount(40);
+    EXPECT_EQ(bands, threads);
+    std::vector<int> thread(static_cast<std::size_t>(bands), -1);
+    std::vector<int> rows(40);
+    parallel::ForEachRowBand(40, bands,
+                             [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
+                               thread[static_cast<std::size_t>(band)] = omp_get_thread_num();
+                               for (std::ptrdiff_t y = begin; y < end; ++y)
+                                 ++rows[static_cast<std::size_t>(y)];
+                             });
+    // Every band has a thread of its own, and every row one band.
+    for (int t = 0; t < threads; ++t) EXPECT_EQ(thread[static_cast<std::size_t>(t)], t);
+    EXPECT_EQ(rows, std::vector<int>(40, 1));
   }
-#endif
 }
 
 TEST_F(AverageFilterThreadsTest, RunsInsideAParallelRegion) {
