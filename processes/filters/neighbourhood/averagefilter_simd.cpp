@@ -166,9 +166,9 @@ class Strip {
     if (bounds_.active && !uniform.active) BoundMeans(bounds_, plan_.Outputs(), scratch_.means);
     if (!Centre().dirty) {
       std::memcpy(out, scratch_.means, plan_.Outputs() * sizeof(T));
-    } else if (HasPixelVectors(plan_.channels)) {
-      MergeVectors(y, out);
-    } else {
+    } else if (!WithPixelVectors(plan_.channels, [&](auto constant) HWY_ATTR {
+                 MergeVectors<constant()>(y, out);
+               })) {
       MergeRuns(y, out);
     }
   }
@@ -193,44 +193,58 @@ class Strip {
   }
 
   // Chooses between mean, no-data, background and the old value, a vector of pixels at a time.
+  template <std::size_t kChannels>
   HWY_ATTR void MergeVectors(std::ptrdiff_t y, T* out) {
+    using D = hn::ScalableTag<T>;
+    using Vectors = PixelVectors<D, kChannels>;
+    const D d;
     const WindowRules<T>& rules = job_.rules;
     const std::size_t width = plan_.strip;
-    const std::size_t channels = plan_.channels;
     const std::uint8_t* const mask = MaskRow(firstColumn_, y, width);
     const T* const pixels = InputRow(firstColumn_, y, width, scratch_.centre);
     const T* const background = rules.HasBackground() ? rules.background().data() : nullptr;
     const T* const noData = rules.HasInputNoData() ? rules.inputNoData().data() : nullptr;
     const T* const written = rules.HasOutputNoData() ? rules.outputNoData().data() : nullptr;
-    const bool keepsAny = mask != nullptr || (noData != nullptr && written == nullptr);
-    if (keepsAny) std::memcpy(scratch_.old, out, plan_.Outputs() * sizeof(T));
-    const T* const old = keepsAny ? scratch_.old : pixels;
     T* const means = scratch_.means;
-    const hn::ScalableTag<T> d;
-    const auto never = hn::MaskFromVec(hn::Zero(d));
-    for (std::size_t x = 0; x < width; x += hn::Lanes(d)) {
-      const std::size_t i = x * channels;
-      const PixelVectors<hn::ScalableTag<T>> pixel(d, pixels + i, channels);
-      const PixelVectors<hn::ScalableTag<T>> kept(d, old + i, channels);
-      const auto isBackground = background != nullptr ? pixel.Equal(background) : never;
-      const auto isNoData = noData != nullptr ? pixel.Equal(noData) : never;
-      const auto isMasked = mask != nullptr ? hn::Not(LoadFlags(d, mask + x)) : never;
-      const auto merge = [&](auto& v, auto keep, std::size_t c) HWY_ATTR {
-        if (background != nullptr) v = hn::IfThenElse(isBackground, hn::Set(d, background[c]), v);
-        if (noData != nullptr) {
-          v = hn::IfThenElse(isNoData, written != nullptr ? hn::Set(d, written[c]) : keep, v);
-        }
-        if (mask != nullptr) v = hn::IfThenElse(isMasked, keep, v);
-      };
-      PixelVectors<hn::ScalableTag<T>> v(d, means + i, channels);
-      merge(v.a, kept.a, 0);
-      if (channels > 1) {
-        merge(v.b, kept.b, 1);
-        merge(v.c, kept.c, 2);
+    // Merges the vector of pixels from x on; `old` and `to` are what the output holds there and
+    // where the result goes.
+    const auto merge = [&](std::size_t x, const T* old, T* to) HWY_ATTR {
+      const Vectors pixel(d, pixels + x * kChannels);
+      Vectors v(d, means + x * kChannels);
+      if (background != nullptr) Choose(pixel.Equal(background), background, v);
+      if (noData != nullptr) {
+        const auto isNoData = pixel.Equal(noData);
+        written != nullptr ? Choose(isNoData, written, v) : Choose(isNoData, Vectors(d, old), v);
       }
-      v.Store(means + i);
+      if (mask != nullptr) {
+        Choose(hn::Not(LoadFlags(d, mask + x)), Vectors(d, old), v);
+      }
+      v.Store(to);
+    };
+    const std::size_t whole = width - width % hn::Lanes(d);
+    for (std::size_t x = 0; x < whole; x += hn::Lanes(d)) {
+      T* const to = out + x * kChannels;
+      merge(x, to, to);
     }
-    std::memcpy(out, means, plan_.Outputs() * sizeof(T));
+    // The last vector would pass the end of the row.
+    const std::size_t rest = (width - whole) * kChannels;
+    std::memcpy(scratch_.old, out + whole * kChannels, rest * sizeof(T));
+    merge(whole, scratch_.old, means + whole * kChannels);
+    std::memcpy(out + whole * kChannels, means + whole * kChannels, rest * sizeof(T));
+  }
+
+  template <class Mask, class D, std::size_t kChannels>
+  static HWY_INLINE void Choose(Mask mask, const T* value, PixelVectors<D, kChannels>& v) {
+    for (std::size_t c = 0; c < kChannels; ++c) {
+      v.channel[c] = hn::IfThenElse(mask, hn::Set(v.d, value[c]), v.channel[c]);
+    }
+  }
+  template <class Mask, class D, std::size_t kChannels>
+  static HWY_INLINE void Choose(Mask mask, const PixelVectors<D, kChannels>& value,
+                                PixelVectors<D, kChannels>& v) {
+    for (std::size_t c = 0; c < kChannels; ++c) {
+      v.channel[c] = hn::IfThenElse(mask, value.channel[c], v.channel[c]);
+    }
   }
 
   // Copies runs of computed pixels, and decides excluded ones one by one.

@@ -83,6 +83,23 @@ struct UniformBounds {
   T replacement{};
 };
 
+/// Rounds floats from 0 to 2^22 to the nearest integer, ties to even, in the low bits of the result:
+/// next to 1.5 * 2^23 the unit in the last place is 1.
+template <class D, class V>
+HWY_INLINE hn::Vec<D> RoundToLowBits(D d, V v) {
+  return hn::BitCast(d, hn::Add(v, hn::Set(hn::RebindToFloat<D>(), 12582912.0F)));
+}
+
+/// Rounded quotients of 16-bit numbers, in the low bits of each lane.
+template <class D>
+HWY_INLINE hn::Vec<D> RoundedQuotients(D d, hn::Vec<D> sums, hn::Vec<D> counts) {
+  const hn::RebindToSigned<D> di;
+  const hn::RebindToFloat<D> df;
+  const auto quotients = hn::Div(hn::ConvertTo(df, hn::BitCast(di, sums)),
+                                 hn::ConvertTo(df, hn::BitCast(di, counts)));
+  return RoundToLowBits(d, quotients);
+}
+
 /// Where the means of a row go: straight into the row, but for the vectors that would pass its end,
 /// which `spill` takes.
 template <typename T>
@@ -148,7 +165,7 @@ class MeanRow {
   template <class DI, class V>
   HWY_INLINE void StoreFloat(DI /*di*/, V mean, T* to) const {
     const hn::Rebind<std::make_unsigned_t<T>, DI> db;
-    StoreUnsigned(db, hn::DemoteTo(db, hn::NearestInt(mean)), to);
+    StoreUnsigned(db, hn::TruncateTo(db, RoundToLowBits(hn::RebindToUnsigned<DI>(), mean)), to);
   }
 
   /// Brings the spilled end of the row home; the sums came in vectors of `lanes`.
@@ -199,13 +216,18 @@ class Means<T, std::uint16_t> {
       row_.StoreUnsigned(d8, hn::TruncateTo(d8, hn::ShiftRightSame(product, by_.shift)), to);
       return;
     }
+    // Even and odd lanes apart, so that no lane changes its place.
     const auto counts = hn::Sub(hn::Set(d, window_), missing);
-    const hn::Half<D> dh;
-    const hn::RepartitionToWide<hn::RebindToSigned<D>> di;
-    row_.StoreFloatQuotients(di, hn::PromoteTo(di, hn::LowerHalf(dh, sums)),
-                             hn::PromoteTo(di, hn::LowerHalf(dh, counts)), to);
-    row_.StoreFloatQuotients(di, hn::PromoteTo(di, hn::UpperHalf(dh, sums)),
-                             hn::PromoteTo(di, hn::UpperHalf(dh, counts)), to + hn::Lanes(dh));
+    const hn::RepartitionToWide<D> dw;
+    const auto low = hn::Set(dw, 0xFFFF);
+    const auto even = RoundedQuotients(dw, hn::And(hn::BitCast(dw, sums), low),
+                                       hn::And(hn::BitCast(dw, counts), low));
+    const auto odd = RoundedQuotients(dw, hn::ShiftRight<16>(hn::BitCast(dw, sums)),
+                                      hn::ShiftRight<16>(hn::BitCast(dw, counts)));
+    const auto rounded =
+        hn::OddEven(hn::BitCast(d, hn::ShiftLeft<16>(odd)), hn::BitCast(d, even));
+    const hn::Rebind<std::uint8_t, D> d8;
+    row_.StoreUnsigned(d8, hn::TruncateTo(d8, rounded), to);
   }
 
  private:

@@ -93,43 +93,55 @@ HWY_INLINE void StoreFlags([[maybe_unused]] D d, hn::Mask<D> mask, std::uint8_t*
   }
 }
 
-/// Whether vectors of pixels can be compared at once.
-constexpr bool HasPixelVectors(std::size_t channels) { return channels == 1 || channels == 3; }
-
 /// A vector of pixels of one or three channels.
-template <class D>
+template <class D, std::size_t kChannels>
 struct PixelVectors {
+  static_assert(kChannels == 1 || kChannels == 3);
+
   template <typename T>
-  HWY_INLINE PixelVectors(D tag, const T* from, std::size_t channels) : d(tag), count(channels) {
-    if (channels == 1) {
-      a = b = c = hn::LoadU(d, from);
+  HWY_INLINE PixelVectors(D tag, const T* from) : d(tag) {
+    if constexpr (kChannels == 1) {
+      channel[0] = hn::LoadU(d, from);
     } else {
-      hn::LoadInterleaved3(d, from, a, b, c);
+      hn::LoadInterleaved3(d, from, channel[0], channel[1], channel[2]);
     }
   }
 
   /// The pixels whose channels all equal `value`.
   template <typename T>
   HWY_INLINE hn::Mask<D> Equal(const T* value) const {
-    const auto first = hn::Eq(a, hn::Set(d, value[0]));
-    if (count == 1) return first;
-    const auto second = hn::Eq(b, hn::Set(d, value[1]));
-    return hn::And(hn::And(first, second), hn::Eq(c, hn::Set(d, value[2])));
+    auto equal = hn::Eq(channel[0], hn::Set(d, value[0]));
+    for (std::size_t c = 1; c < kChannels; ++c) {
+      equal = hn::And(equal, hn::Eq(channel[c], hn::Set(d, value[c])));
+    }
+    return equal;
   }
 
   template <typename T>
   HWY_INLINE void Store(T* to) const {
-    if (count == 1) {
-      hn::StoreU(a, d, to);
+    if constexpr (kChannels == 1) {
+      hn::StoreU(channel[0], d, to);
     } else {
-      hn::StoreInterleaved3(a, b, c, d, to);
+      hn::StoreInterleaved3(channel[0], channel[1], channel[2], d, to);
     }
   }
 
   D d;
-  std::size_t count;
-  hn::Vec<D> a, b, c;
+  hn::Vec<D> channel[kChannels];
 };
+
+/// Calls `use` with the number of channels as a constant where vectors of such pixels exist.
+template <class Use>
+HWY_INLINE bool WithPixelVectors(std::size_t channels, const Use& use) {
+  if (channels == 1) {
+    use(std::integral_constant<std::size_t, 1>());
+  } else if (channels == 3) {
+    use(std::integral_constant<std::size_t, 3>());
+  } else {
+    return false;
+  }
+  return true;
+}
 
 /// The reasons for which a pixel of a row is excluded; null pointers switch a reason off.
 template <typename T>
@@ -148,8 +160,9 @@ struct ExclusionTests {
   }
 
   /// For the pixels from i on.
-  template <class D>
-  HWY_INLINE hn::Mask<D> ExcludesVector(D d, const PixelVectors<D>& pixels, std::size_t i) const {
+  template <class D, std::size_t kChannels>
+  HWY_INLINE hn::Mask<D> ExcludesVector(D d, const PixelVectors<D, kChannels>& pixels,
+                                        std::size_t i) const {
     auto excluded = hn::MaskFromVec(hn::Zero(d));
     if (noData != nullptr) excluded = pixels.Equal(noData);
     if (background != nullptr) excluded = hn::Or(excluded, pixels.Equal(background));
@@ -172,6 +185,22 @@ HWY_ATTR bool AnySampleEquals(const T* row, std::size_t samples, const T* values
   return !hn::AllFalse(d, hn::Or(any, rest));
 }
 
+/// Whether any pixel of a row is excluded; `kChannels` is 1 or 3.
+template <std::size_t kChannels, typename T>
+HWY_ATTR bool AnyVectorExcluded(const T* row, std::size_t pixels, const ExclusionTests<T>& tests) {
+  using D = hn::ScalableTag<T>;
+  const D d;
+  std::size_t i = 0;
+  for (; i + hn::Lanes(d) <= pixels; i += hn::Lanes(d)) {
+    const PixelVectors<D, kChannels> vectors(d, row + i * kChannels);
+    if (!hn::AllFalse(d, tests.ExcludesVector(d, vectors, i))) return true;
+  }
+  // What lies beyond the row does not count.
+  const PixelVectors<D, kChannels> vectors(d, row + i * kChannels);
+  const auto excluded = tests.ExcludesVector(d, vectors, i);
+  return !hn::AllFalse(d, hn::And(excluded, hn::FirstN(d, pixels - i)));
+}
+
 /// Whether any pixel of a row is excluded.
 template <typename T>
 HWY_ATTR bool AnyExcluded(const T* row, std::size_t pixels, std::size_t channels,
@@ -181,23 +210,31 @@ HWY_ATTR bool AnyExcluded(const T* row, std::size_t pixels, std::size_t channels
       (tests.background == nullptr || !AnySampleEquals(row, pixels * channels, tests.background))) {
     return false;
   }
-  std::size_t i = 0;
-  if (HasPixelVectors(channels)) {
-    const hn::ScalableTag<T> d;
-    const auto excludes = [&] HWY_ATTR {
-      const PixelVectors<hn::ScalableTag<T>> vectors(d, row + i * channels, channels);
-      return tests.ExcludesVector(d, vectors, i);
-    };
-    for (; i + hn::Lanes(d) <= pixels; i += hn::Lanes(d)) {
-      if (!hn::AllFalse(d, excludes())) return true;
-    }
-    // What lies beyond the row does not count.
-    return !hn::AllFalse(d, hn::And(excludes(), hn::FirstN(d, pixels - i)));
+  bool any = false;
+  const bool vectors = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
+    any = AnyVectorExcluded<constant()>(row, pixels, tests);
+  });
+  for (std::size_t i = 0; !vectors && !any && i < pixels; ++i) {
+    any = tests.Excludes(row, channels, i);
   }
-  for (; i < pixels; ++i) {
-    if (tests.Excludes(row, channels, i)) return true;
+  return any;
+}
+
+/// Copies a row with the samples of excluded pixels made neutral, and flags these pixels;
+/// `kChannels` is 1 or 3.
+template <std::size_t kChannels, typename T>
+HWY_ATTR void CopyVectorsUnexcluded(const T* row, std::size_t pixels,
+                                    const ExclusionTests<T>& tests, T* to, std::uint8_t* flags) {
+  using D = hn::ScalableTag<T>;
+  const D d;
+  const auto neutral = hn::Set(d, kNeutralSample<T>);
+  for (std::size_t i = 0; i < pixels; i += hn::Lanes(d)) {
+    PixelVectors<D, kChannels> v(d, row + i * kChannels);
+    const auto excluded = tests.ExcludesVector(d, v, i);
+    StoreFlags(d, excluded, flags + i);
+    for (auto& channel : v.channel) channel = hn::IfThenElse(excluded, neutral, channel);
+    v.Store(to + i * kChannels);
   }
-  return false;
 }
 
 /// Copies a row, perhaps onto itself, with the samples of excluded pixels made neutral, and flags
@@ -205,25 +242,14 @@ HWY_ATTR bool AnyExcluded(const T* row, std::size_t pixels, std::size_t channels
 template <typename T>
 HWY_ATTR void CopyUnexcluded(const T* row, std::size_t pixels, std::size_t channels,
                              ExclusionTests<T> tests, T* to, std::uint8_t* flags) {
-  if (HasPixelVectors(channels)) {
-    const hn::ScalableTag<T> d;
-    const auto neutral = hn::Set(d, kNeutralSample<T>);
-    for (std::size_t i = 0; i < pixels; i += hn::Lanes(d)) {
-      PixelVectors<hn::ScalableTag<T>> v(d, row + i * channels, channels);
-      const auto excluded = tests.ExcludesVector(d, v, i);
-      StoreFlags(d, excluded, flags + i);
-      v.a = hn::IfThenElse(excluded, neutral, v.a);
-      v.b = hn::IfThenElse(excluded, neutral, v.b);
-      v.c = hn::IfThenElse(excluded, neutral, v.c);
-      v.Store(to + i * channels);
-    }
-  } else {
-    for (std::size_t i = 0; i < pixels; ++i) {
-      const bool excluded = tests.Excludes(row, channels, i);
-      flags[i] = excluded ? 1 : 0;
-      for (std::size_t c = i * channels; c < (i + 1) * channels; ++c) {
-        to[c] = excluded ? kNeutralSample<T> : row[c];
-      }
+  const bool vectors = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
+    CopyVectorsUnexcluded<constant()>(row, pixels, tests, to, flags);
+  });
+  for (std::size_t i = 0; !vectors && i < pixels; ++i) {
+    const bool excluded = tests.Excludes(row, channels, i);
+    flags[i] = excluded ? 1 : 0;
+    for (std::size_t c = i * channels; c < (i + 1) * channels; ++c) {
+      to[c] = excluded ? kNeutralSample<T> : row[c];
     }
   }
 }
