@@ -8,8 +8,8 @@
 namespace zarn::bench {
 
 /// One case of a filter beside its peer on the same data. The two and a copy of the block are timed
-/// in turns, each after one run of its own that is not timed, so that changes in the machine's speed
-/// and threads left over from the one before fall on all alike.
+/// in turns, each after one run of its own that is not timed, so that changes in the machine's
+/// speed and threads left over from the one before fall on all alike.
 struct Comparison {
   std::string name;        ///< "average u8x1 1024 size 5 clean"
   std::string peer;        ///< "boxFilter"
@@ -22,7 +22,8 @@ struct Comparison {
 void Compare(Comparison comparison);
 
 /// Runs all registered cases that the command line selects (the flags of Google Benchmark) and
-/// prints the table: medians of the times, and of the ratios turn by turn. Returns the exit status of the program.
+/// prints the table: medians of the times, and of the ratios turn by turn. Returns the exit status
+/// of the program.
 int RunComparisons(int argc, char** argv);
 
 }  // namespace zarn::bench

@@ -46,15 +46,17 @@ bool PixelEquals(const T* pixel, const T* value, std::size_t channels) {
   return true;
 }
 
+/// Differences below this do not tell a floating sample from a no-data value.
+inline constexpr double kNoDataTolerance = 2.220446049250313e-16;
+
 /// Equality of whole pixels: exact for integers; for floating types the difference of each channel,
 /// in double, must stay below the tolerance.
 template <typename T>
 bool PixelNearlyEquals(const T* pixel, const T* value, std::size_t channels) {
   if constexpr (std::is_floating_point_v<T>) {
-    constexpr double kTolerance = 2.220446049250313e-16;
     for (std::size_t c = 0; c < channels; ++c) {
       const double difference = static_cast<double>(pixel[c]) - static_cast<double>(value[c]);
-      if (!(std::abs(difference) < kTolerance)) return false;
+      if (!(std::abs(difference) < kNoDataTolerance)) return false;
     }
     return true;
   } else {

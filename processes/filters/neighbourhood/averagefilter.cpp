@@ -4,12 +4,11 @@
 #include <cstddef>
 #include <memory>
 #include <new>
-#include <optional>
 #include <type_traits>
 #include <vector>
 
-#include "host/gobs/datatypeadapter.h"
 #include "processes/filters/framework/blockchecks.h"
+#include "processes/filters/framework/channelconverters.h"
 #include "processes/filters/framework/parallel.h"
 #include "processes/filters/framework/sampletypes.h"
 #include "processes/filters/neighbourhood/averagerows.h"
@@ -21,24 +20,6 @@ namespace zarn::processes::filters {
 namespace {
 
 constexpr const char* kUnknownType = "Unknown raster block data type for average filter.";
-
-struct Bounds {
-  double low;
-  double high;
-};
-
-template <typename T>
-std::vector<OutputConverter<T>> MakeConverters(const std::vector<Bounds>& bounds,
-                                               const std::vector<double>& outputNoData) {
-  std::vector<OutputConverter<T>> converters;
-  converters.reserve(bounds.size());
-  for (std::size_t c = 0; c < bounds.size(); ++c) {
-    const std::optional<double> noData =
-        outputNoData.empty() ? std::nullopt : std::optional(outputNoData[c]);
-    converters.emplace_back(bounds[c].low, bounds[c].high, noData);
-  }
-  return converters;
-}
 
 template <typename T>
 void AverageBlock(const AverageJob<T>& job) {
@@ -67,11 +48,7 @@ FilterResult CPUAverageFilter::Process(const gobs::Raster& input, gobs::Raster& 
                                        std::uint32_t /*blockX*/, std::uint32_t /*blockY*/,
                                        const std::uint8_t* inputMask) {
   const gobs::NativeDataTypeCode code = gobs::GetDataTypeCode(input);
-  std::vector<Bounds> bounds;
-  for (std::uint32_t c = 0; c < input.Channels(); ++c) {
-    bounds.push_back(
-        {gobs::DataTypeAdapter::MinValue(code), gobs::DataTypeAdapter::MaxValue(code)});
-  }
+  const std::vector<ChannelBounds> bounds = TypeBounds(code, input.Channels());
   return VisitSampleType(code, kUnknownType, [&]<typename T>(std::type_identity<T>) {
     const int half = HalfWindow(kernelSize);
     if (auto refusal = blockchecks::CheckCoversOutput(input, output)) return *refusal;

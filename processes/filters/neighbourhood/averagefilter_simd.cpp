@@ -211,13 +211,13 @@ class Strip {
     const auto merge = [&](std::size_t x, const T* old, T* to) HWY_ATTR {
       const Vectors pixel(d, pixels + x * kChannels);
       Vectors v(d, means + x * kChannels);
-      if (background != nullptr) Choose(pixel.Equal(background), background, v);
+      if (background != nullptr) v.Replace(pixel.Equal(background), background);
       if (noData != nullptr) {
         const auto isNoData = pixel.Equal(noData);
-        written != nullptr ? Choose(isNoData, written, v) : Choose(isNoData, Vectors(d, old), v);
+        written != nullptr ? v.Replace(isNoData, written) : v.Replace(isNoData, Vectors(d, old));
       }
       if (mask != nullptr) {
-        Choose(hn::Not(LoadFlags(d, mask + x)), Vectors(d, old), v);
+        v.Replace(hn::Not(LoadFlags(d, mask + x)), Vectors(d, old));
       }
       v.Store(to);
     };
@@ -231,20 +231,6 @@ class Strip {
     std::memcpy(scratch_.old, out + whole * kChannels, rest * sizeof(T));
     merge(whole, scratch_.old, means + whole * kChannels);
     std::memcpy(out + whole * kChannels, means + whole * kChannels, rest * sizeof(T));
-  }
-
-  template <class Mask, class D, std::size_t kChannels>
-  static HWY_INLINE void Choose(Mask mask, const T* value, PixelVectors<D, kChannels>& v) {
-    for (std::size_t c = 0; c < kChannels; ++c) {
-      v.channel[c] = hn::IfThenElse(mask, hn::Set(v.d, value[c]), v.channel[c]);
-    }
-  }
-  template <class Mask, class D, std::size_t kChannels>
-  static HWY_INLINE void Choose(Mask mask, const PixelVectors<D, kChannels>& value,
-                                PixelVectors<D, kChannels>& v) {
-    for (std::size_t c = 0; c < kChannels; ++c) {
-      v.channel[c] = hn::IfThenElse(mask, value.channel[c], v.channel[c]);
-    }
   }
 
   // Copies runs of computed pixels, and decides excluded ones one by one.

@@ -83,8 +83,8 @@ struct UniformBounds {
   T replacement{};
 };
 
-/// Rounds floats from 0 to 2^22 to the nearest integer, ties to even, in the low bits of the result:
-/// next to 1.5 * 2^23 the unit in the last place is 1.
+/// Rounds floats from 0 to 2^22 to the nearest integer, ties to even, in the low bits of the
+/// result: next to 1.5 * 2^23 the unit in the last place is 1.
 template <class D, class V>
 HWY_INLINE hn::Vec<D> RoundToLowBits(D d, V v) {
   return hn::BitCast(d, hn::Add(v, hn::Set(hn::RebindToFloat<D>(), 12582912.0F)));
@@ -95,8 +95,8 @@ template <class D>
 HWY_INLINE hn::Vec<D> RoundedQuotients(D d, hn::Vec<D> sums, hn::Vec<D> counts) {
   const hn::RebindToSigned<D> di;
   const hn::RebindToFloat<D> df;
-  const auto quotients = hn::Div(hn::ConvertTo(df, hn::BitCast(di, sums)),
-                                 hn::ConvertTo(df, hn::BitCast(di, counts)));
+  const auto quotients =
+      hn::Div(hn::ConvertTo(df, hn::BitCast(di, sums)), hn::ConvertTo(df, hn::BitCast(di, counts)));
   return RoundToLowBits(d, quotients);
 }
 
@@ -224,8 +224,7 @@ class Means<T, std::uint16_t> {
                                        hn::And(hn::BitCast(dw, counts), low));
     const auto odd = RoundedQuotients(dw, hn::ShiftRight<16>(hn::BitCast(dw, sums)),
                                       hn::ShiftRight<16>(hn::BitCast(dw, counts)));
-    const auto rounded =
-        hn::OddEven(hn::BitCast(d, hn::ShiftLeft<16>(odd)), hn::BitCast(d, even));
+    const auto rounded = hn::OddEven(hn::BitCast(d, hn::ShiftLeft<16>(odd)), hn::BitCast(d, even));
     const hn::Rebind<std::uint8_t, D> d8;
     row_.StoreUnsigned(d8, hn::TruncateTo(d8, rounded), to);
   }

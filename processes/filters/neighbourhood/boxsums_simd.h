@@ -23,6 +23,7 @@
 #include <type_traits>
 
 #include "processes/filters/framework/nodata.h"
+#include "processes/filters/framework/pixelvectors_simd.h"
 #include "processes/filters/neighbourhood/boxrows.h"
 
 HWY_BEFORE_NAMESPACE();
@@ -53,94 +54,11 @@ HWY_INLINE hn::Vec<D> LoadAs(D d, const T* from) {
     const auto top = hn::Set(db, static_cast<Bits>(Bits{1} << (8 * sizeof(T) - 1)));
     const auto v = hn::Xor(hn::LoadU(db, reinterpret_cast<const Bits*>(from)), top);
     return Widen(d, v);
-  } else if constexpr (std::is_same_v<Acc, double> && std::is_same_v<T, std::uint32_t>) {
-    const hn::Rebind<T, D> dt;
-    const hn::Rebind<std::int32_t, D> di;
-    const auto shifted = hn::BitCast(di, hn::Xor(hn::LoadU(dt, from), hn::Set(dt, 0x80000000U)));
-    return hn::Add(hn::PromoteTo(d, shifted), hn::Set(d, 2147483648.0));
+  } else if constexpr (std::is_same_v<Acc, double>) {
+    return LoadDoubles(d, from);
   } else {
     return Widen(d, hn::LoadU(hn::Rebind<T, D>(), from));
   }
-}
-
-/// Loads one byte per lane and tells which are not zero.
-template <class D>
-HWY_INLINE hn::Mask<D> LoadFlags([[maybe_unused]] D d, const std::uint8_t* from) {
-  const hn::RebindToUnsigned<D> du;
-  const hn::Rebind<std::uint8_t, D> d8;
-  const auto bytes = hn::LoadU(d8, from);
-  hn::Vec<decltype(du)> lanes;
-  if constexpr (sizeof(hn::TFromD<D>) == 1) {
-    lanes = bytes;
-  } else if constexpr (sizeof(hn::TFromD<D>) == 8) {
-    lanes = hn::PromoteTo(du, hn::PromoteTo(hn::Rebind<std::uint32_t, D>(), bytes));
-  } else {
-    lanes = hn::PromoteTo(du, bytes);
-  }
-  return hn::RebindMask(d, hn::Ne(lanes, hn::Zero(du)));
-}
-
-/// Stores one byte per lane: 1 where `mask` is set, else 0.
-template <class D>
-HWY_INLINE void StoreFlags([[maybe_unused]] D d, hn::Mask<D> mask, std::uint8_t* to) {
-  const hn::RebindToUnsigned<D> du;
-  const hn::Rebind<std::uint8_t, D> d8;
-  const auto ones = hn::IfThenElseZero(hn::RebindMask(du, mask), hn::Set(du, 1));
-  if constexpr (sizeof(hn::TFromD<D>) == 1) {
-    hn::StoreU(ones, d8, to);
-  } else {
-    hn::StoreU(hn::TruncateTo(d8, ones), d8, to);
-  }
-}
-
-/// A vector of pixels of one or three channels.
-template <class D, std::size_t kChannels>
-struct PixelVectors {
-  static_assert(kChannels == 1 || kChannels == 3);
-
-  template <typename T>
-  HWY_INLINE PixelVectors(D tag, const T* from) : d(tag) {
-    if constexpr (kChannels == 1) {
-      channel[0] = hn::LoadU(d, from);
-    } else {
-      hn::LoadInterleaved3(d, from, channel[0], channel[1], channel[2]);
-    }
-  }
-
-  /// The pixels whose channels all equal `value`.
-  template <typename T>
-  HWY_INLINE hn::Mask<D> Equal(const T* value) const {
-    auto equal = hn::Eq(channel[0], hn::Set(d, value[0]));
-    for (std::size_t c = 1; c < kChannels; ++c) {
-      equal = hn::And(equal, hn::Eq(channel[c], hn::Set(d, value[c])));
-    }
-    return equal;
-  }
-
-  template <typename T>
-  HWY_INLINE void Store(T* to) const {
-    if constexpr (kChannels == 1) {
-      hn::StoreU(channel[0], d, to);
-    } else {
-      hn::StoreInterleaved3(channel[0], channel[1], channel[2], d, to);
-    }
-  }
-
-  D d;
-  hn::Vec<D> channel[kChannels];
-};
-
-/// Calls `use` with the number of channels as a constant where vectors of such pixels exist.
-template <class Use>
-HWY_INLINE bool WithPixelVectors(std::size_t channels, const Use& use) {
-  if (channels == 1) {
-    use(std::integral_constant<std::size_t, 1>());
-  } else if (channels == 3) {
-    use(std::integral_constant<std::size_t, 3>());
-  } else {
-    return false;
-  }
-  return true;
 }
 
 /// The reasons for which a pixel of a row is excluded; null pointers switch a reason off.
@@ -185,7 +103,7 @@ HWY_ATTR bool AnySampleEquals(const T* row, std::size_t samples, const T* values
   return !hn::AllFalse(d, hn::Or(any, rest));
 }
 
-/// Whether any pixel of a row is excluded; `kChannels` is 1 or 3.
+/// Whether any pixel of a row is excluded; see WithPixelVectors.
 template <std::size_t kChannels, typename T>
 HWY_ATTR bool AnyVectorExcluded(const T* row, std::size_t pixels, const ExclusionTests<T>& tests) {
   using D = hn::ScalableTag<T>;

@@ -1,0 +1,52 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <utility>
+#include <vector>
+
+#include "processes/filters/colorbalance/balancepixels.h"
+#include "processes/filters/framework/blockchecks.h"
+#include "processes/filters/framework/messages.h"
+#include "processes/filters/framework/sampletypes.h"
+
+namespace zarn::processes::filters {
+
+/// Calls `visit` with the sample type where colour balancers and normalisation handle it.
+template <typename Visitor>
+FilterResult VisitBalanced(gobs::NativeDataTypeCode code, Visitor&& visit) {
+  return VisitSampleType(code, "Unknown raster block data type for color balancing",
+                         std::forward<Visitor>(visit));
+}
+
+/// What these families refuse before they write anything. `parameters` is the number of channels
+/// that all parameters have.
+inline blockchecks::Refusal CheckBalanced(const gobs::Raster& input, const gobs::Raster& output,
+                                          const std::vector<double>& inputNoData,
+                                          const std::vector<double>& outputNoData,
+                                          std::size_t parameters) {
+  if (input.Width() != output.Width() || input.Height() != output.Height()) {
+    return FilterResult::Failure(messages::kSizesDiffer);
+  }
+  if (auto refusal = blockchecks::CheckBlocks(input, output, inputNoData, outputNoData,
+                                              blockchecks::Aliasing::kSameBlockAllowed)) {
+    return refusal;
+  }
+  if (parameters < input.Channels()) return FilterResult::Failure(messages::kFewParameters);
+  return std::nullopt;
+}
+
+/// Shares out blocks of more than `serialUpTo` pixels.
+inline BalanceSharing ShareAbove(std::int64_t serialUpTo, const gobs::RasterInfo& block) {
+  const std::int64_t pixels = std::int64_t{block.Width()} * block.Height();
+  return {pixels > serialUpTo && parallel::MayShareOut(), pixels};
+}
+
+/// Shares out every block.
+inline BalanceSharing ShareAlways(const gobs::RasterInfo& block) {
+  return {true, std::int64_t{block.Width()} * block.Height()};
+}
+
+}  // namespace zarn::processes::filters

@@ -1,0 +1,223 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <algorithm>
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <memory>
+#include <new>
+#include <type_traits>
+#include <vector>
+
+#include "host/sys/openmp.h"
+#include "processes/filters/colorbalance/balancejob.h"
+#include "processes/filters/framework/parallel.h"
+#if ZARN_SIMD
+#include "processes/filters/framework/samplerows_simd.h"
+#endif
+
+namespace zarn::processes::filters {
+
+/// The definition of every balancer, for pixels `begin` .. `end` - 1: excluded pixels by the rules,
+/// all others by the correction and the channel's converter.
+///
+/// A correction has `void Run(const PixelRun&)`. `values` has room for one pixel.
+template <typename T, class Correction>
+void BalancePixels(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
+                   Correction& correction, double* values) {
+  const std::size_t channels = job.channels;
+  for (std::size_t i = begin; i < end; ++i) {
+    const T* const in = job.input + i * channels;
+    T* const out = job.output + i * channels;
+    if (job.rules.Excludes(in, i)) {
+      job.rules.WriteExcluded(out);
+      continue;
+    }
+    for (std::size_t c = 0; c < channels; ++c) values[c] = static_cast<double>(in[c]);
+    correction.Run({values, 1, 1, channels, i % job.width, i / job.width, nullptr});
+    for (std::size_t c = 0; c < channels; ++c) out[c] = job.converters[c](values[c]);
+  }
+}
+
+/// Pixels that a correction is given at a time at most.
+inline constexpr std::size_t kRunPixels = 512;
+
+#if ZARN_SIMD
+
+/// Samples that have vector loops.
+template <typename T>
+inline constexpr bool kHasSampleRows = !std::is_integral_v<T> || sizeof(T) <= 4;
+
+/// Scratch of one band: rows of samples and of values, padded.
+template <typename T>
+class RunScratch {
+ public:
+  explicit RunScratch(std::size_t channels)
+      : run_(std::clamp<std::size_t>(4 * kRunPixels / std::max<std::size_t>(channels, 1) / 64 * 64,
+                                     64, kRunPixels)),
+        samples_(Rows<T>(channels)),
+        planes_(Rows<T>(channels)),
+        old_(Rows<T>(channels)),
+        values_(Rows<double>(channels)),
+        flags_(Rows<std::uint8_t>(1)),
+        mask_(Rows<std::uint8_t>(1)) {}
+
+  /// Pixels of a run, a multiple of every vector's length.
+  std::size_t Run() const { return run_; }
+  /// Elements from one channel to the next.
+  std::size_t Pitch() const { return run_ + kSampleRowPadding; }
+  T* Samples() { return samples_.get(); }
+  T* Planes() { return planes_.get(); }
+  T* Old() { return old_.get(); }
+  double* Values() { return values_.get(); }
+  std::uint8_t* Flags() { return flags_.get(); }
+  std::uint8_t* Mask() { return mask_.get(); }
+
+ private:
+  template <typename U>
+  struct Release {
+    void operator()(U* rows) const { ::operator delete[](rows, kAlignment); }
+  };
+  template <typename U>
+  using RowsOf = std::unique_ptr<U[], Release<U>>;
+
+  static constexpr std::align_val_t kAlignment{64};
+
+  template <typename U>
+  RowsOf<U> Rows(std::size_t channels) const {
+    const std::size_t size = std::max<std::size_t>(channels, 1) * Pitch();
+    auto* const rows = static_cast<U*>(::operator new[](size * sizeof(U), kAlignment));
+    std::fill_n(rows, size, U{});
+    return RowsOf<U>(rows);
+  }
+
+  std::size_t run_;
+  RowsOf<T> samples_;
+  RowsOf<T> planes_;
+  RowsOf<T> old_;
+  RowsOf<double> values_;
+  RowsOf<std::uint8_t> flags_;
+  RowsOf<std::uint8_t> mask_;
+};
+
+/// Blocks of more bytes leave the caches before anybody reads them again.
+inline constexpr std::size_t kStreamedBytes = std::size_t{8} << 20;
+
+/// The loop that all fast balancers share: takes runs of pixels of one row apart into channels,
+/// calls `balance(run, excluded)` on these (in place, in `scratch.Planes()`), and puts them
+/// together again by the rules. `run` has no values yet.
+template <typename T, class Balance>
+void ForEachRun(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
+                RunScratch<T>& scratch, const Balance& balance) {
+  const std::size_t channels = job.channels;
+  const std::size_t pitch = scratch.Pitch();
+  const BalanceRules<T>& rules = job.rules;
+  const bool streams = job.Pixels() * channels * sizeof(T) > kStreamedBytes;
+  const bool tests = rules.mask() != nullptr || rules.inputNoData() != nullptr;
+  for (std::size_t i = begin; i < end;) {
+    const std::size_t column = i % job.width;
+    const std::size_t count = std::min({scratch.Run(), job.width - column, end - i});
+    T* const out = job.output + i * channels;
+    // Vectors may read past the run but not past the block.
+    const T* in = job.input + i * channels;
+    const std::uint8_t* mask = rules.mask() == nullptr ? nullptr : rules.mask() + i;
+    if (i + count + kSampleRowPadding > job.Pixels()) {
+      in = std::copy_n(in, count * channels, scratch.Samples()) - count * channels;
+      if (mask != nullptr) mask = std::copy_n(mask, count, scratch.Mask()) - count;
+    }
+    T* const planes = scratch.Planes();
+    SplitChannels(in, count, channels, planes, pitch);
+    const bool any = tests && FlagExcluded(planes, pitch, count, channels, rules.inputNoData(),
+                                           mask, scratch.Flags());
+    const std::uint8_t* const flags = any ? scratch.Flags() : nullptr;
+    balance(PixelRun{nullptr, pitch, count, channels, column, i / job.width, flags});
+    ExcludedPixels<T> excluded{flags, rules.outputNoData(), scratch.Old()};
+    if (any && excluded.value == nullptr) std::copy_n(out, count * channels, scratch.Old());
+    JoinChannels(planes, pitch, count, channels, excluded, scratch.Samples());
+    const std::size_t bytes = count * channels * sizeof(T);
+    if (streams) {
+      StreamBytes(reinterpret_cast<const std::byte*>(scratch.Samples()), bytes,
+                  reinterpret_cast<std::byte*>(out));
+    } else {
+      std::memcpy(out, scratch.Samples(), bytes);
+    }
+    i += count;
+  }
+  if (streams) FinishStreaming();
+}
+
+/// The same as `BalancePixels`, bit for bit.
+template <typename T, class Correction>
+void BalanceRuns(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
+                 Correction& correction, RunScratch<T>& scratch) {
+  ForEachRun(job, begin, end, scratch, [&](PixelRun run) {
+    run.values = scratch.Values();
+    for (std::size_t c = 0; c < run.channels; ++c) {
+      WidenSamples(scratch.Planes() + c * run.pitch, run.count, run.Channel(c));
+    }
+    correction.Run(run);
+    for (std::size_t c = 0; c < run.channels; ++c) {
+      NarrowSamples(run.Channel(c), run.count, job.converters[c], scratch.Planes() + c * run.pitch);
+    }
+  });
+}
+
+#endif
+
+/// How a family shares out its pixels.
+struct BalanceSharing {
+  bool parallel;      ///< else the calling thread does all
+  std::int64_t most;  ///< threads at most
+};
+
+/// Calls `prepare(bands)` once and then `work(band, begin, end)` for contiguous bands of pixels.
+/// Exceptions are rethrown when all bands have ended.
+template <typename Prepare, typename Work>
+void ForEachPixelBand(std::size_t pixels, const BalanceSharing& sharing, const Prepare& prepare,
+                      const Work& work) {
+  const sys::OMPThreadCount threads(sharing.parallel ? sharing.most : 1);
+  const std::ptrdiff_t bands = parallel::BandCount(static_cast<std::ptrdiff_t>(pixels));
+  prepare(static_cast<std::size_t>(bands));
+  parallel::ForEachRowBandRethrowing(
+      static_cast<std::ptrdiff_t>(pixels), bands,
+      [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
+        work(static_cast<std::size_t>(band), static_cast<std::size_t>(begin),
+             static_cast<std::size_t>(end));
+      });
+}
+
+/// Balances a block by a correction that may depend on the position. Each band has a copy of it.
+template <typename T, class Correction>
+void Balance(const BalanceJob<T>& job, const BalanceSharing& sharing,
+             const Correction& correction) {
+  if (job.Pixels() == 0 || job.channels == 0) return;
+  std::vector<Correction> corrections;
+#if ZARN_SIMD
+  if constexpr (kHasSampleRows<T>) {
+    if (HasVectors()) {
+      std::vector<RunScratch<T>> scratch;
+      const auto prepare = [&](std::size_t bands) {
+        corrections.assign(bands, correction);
+        for (std::size_t b = 0; b < bands; ++b) scratch.emplace_back(job.channels);
+      };
+      ForEachPixelBand(job.Pixels(), sharing, prepare,
+                       [&](std::size_t band, std::size_t begin, std::size_t end) {
+                         BalanceRuns(job, begin, end, corrections[band], scratch[band]);
+                       });
+      return;
+    }
+  }
+#endif
+  std::vector<double> values;
+  const auto prepare = [&](std::size_t bands) {
+    corrections.assign(bands, correction);
+    values.resize(bands * job.channels);
+  };
+  ForEachPixelBand(
+      job.Pixels(), sharing, prepare, [&](std::size_t band, std::size_t begin, std::size_t end) {
+        BalancePixels(job, begin, end, corrections[band], values.data() + band * job.channels);
+      });
+}
+
+}  // namespace zarn::processes::filters

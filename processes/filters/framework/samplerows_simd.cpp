@@ -1,0 +1,307 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "processes/filters/framework/samplerows_simd.h"
+
+#include <hwy/cache_control.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <cstring>
+#include <limits>
+#include <type_traits>
+
+#include "processes/filters/framework/nodata.h"
+
+// Targets that share their kernels with another one, and those whose vectors may be wider than the
+// padding of rows.
+#define HWY_DISABLED_TARGETS \
+  (HWY_SSSE3 | HWY_AVX3_DL | HWY_SVE | HWY_SVE2 | HWY_SVE_256 | HWY_SVE2_128 | HWY_RVV)
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "processes/filters/framework/samplerows_simd.cpp"
+#include <hwy/foreach_target.h>
+// foreach_target.h must come first.
+#include <hwy/highway.h>
+
+#include "processes/filters/framework/pixelvectors_simd.h"
+
+HWY_BEFORE_NAMESPACE();
+namespace zarn::processes::filters::HWY_NAMESPACE {
+
+bool Vectors() { return HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128; }
+
+template <typename T>
+HWY_ATTR void Split(const T* pixels, std::size_t count, std::size_t channels, T* planes,
+                    std::size_t pitch) {
+  const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
+    constexpr std::size_t kChannels = constant();
+    const hn::ScalableTag<T> d;
+    for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
+      const PixelVectors<hn::ScalableTag<T>, kChannels> v(d, pixels + i * kChannels);
+      for (std::size_t c = 0; c < kChannels; ++c) {
+        hn::StoreU(v.channel[c], d, planes + c * pitch + i);
+      }
+    }
+  });
+  if (done) return;
+  for (std::size_t c = 0; c < channels; ++c) {
+    for (std::size_t i = 0; i < count; ++i) planes[c * pitch + i] = pixels[i * channels + c];
+  }
+}
+
+template <typename T>
+HWY_ATTR void Join(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
+                   const ExcludedPixels<T>& excluded, T* pixels) {
+  const ExcludedPixels<T> e = excluded;
+  const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
+    constexpr std::size_t kChannels = constant();
+    const hn::ScalableTag<T> d;
+    for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
+      PixelVectors<hn::ScalableTag<T>, kChannels> v(d);
+      for (std::size_t c = 0; c < kChannels; ++c) {
+        v.channel[c] = hn::LoadU(d, planes + c * pitch + i);
+      }
+      if (e.flags != nullptr) {
+        const auto isExcluded = LoadFlags(d, e.flags + i);
+        if (e.value != nullptr) {
+          v.Replace(isExcluded, e.value);
+        } else {
+          v.Replace(isExcluded,
+                    PixelVectors<hn::ScalableTag<T>, kChannels>(d, e.old + i * kChannels));
+        }
+      }
+      v.Store(pixels + i * kChannels);
+    }
+  });
+  if (done) return;
+  for (std::size_t i = 0; i < count; ++i) {
+    const bool isExcluded = e.flags != nullptr && e.flags[i] != 0;
+    for (std::size_t c = 0; c < channels; ++c) {
+      const std::size_t at = i * channels + c;
+      pixels[at] = !isExcluded          ? planes[c * pitch + i]
+                   : e.value != nullptr ? e.value[c]
+                                        : e.old[at];
+    }
+  }
+}
+
+template <typename T>
+HWY_ATTR bool Flag(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
+                   const T* noData, const std::uint8_t* mask, std::uint8_t* flags) {
+  // Only floats have to be compared in double.
+  using Lane = std::conditional_t<std::is_same_v<T, float>, double, T>;
+  const hn::ScalableTag<Lane> d;
+  const hn::Rebind<std::uint8_t, decltype(d)> d8;
+  auto any = hn::Zero(d8);
+  const auto flag = [&](std::size_t i) HWY_ATTR {
+    auto excluded = hn::MaskFromVec(hn::Zero(d));
+    if (noData != nullptr) {
+      excluded = NearlyEqual(d, planes + i, noData[0]);
+      for (std::size_t c = 1; c < channels; ++c) {
+        excluded = hn::And(excluded, NearlyEqual(d, planes + c * pitch + i, noData[c]));
+      }
+    }
+    if (mask != nullptr) excluded = hn::Or(excluded, hn::Not(LoadFlags(d, mask + i)));
+    StoreFlags(d, excluded, flags + i);
+    return hn::LoadU(d8, flags + i);
+  };
+  std::size_t i = 0;
+  for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) any = hn::Or(any, flag(i));
+  // What lies beyond the row does not count.
+  if (i < count) any = hn::Or(any, hn::IfThenElseZero(hn::FirstN(d8, count - i), flag(i)));
+  return !hn::AllTrue(d8, hn::Eq(any, hn::Zero(d8)));
+}
+
+template <typename T>
+HWY_ATTR void Widen(const T* samples, std::size_t count, double* values) {
+  const hn::ScalableTag<double> d;
+  for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
+    hn::StoreU(LoadDoubles(d, samples + i), d, values + i);
+  }
+}
+
+/// The rules of an output converter on vectors of doubles.
+template <typename T>
+class VectorConverter {
+ public:
+  explicit VectorConverter(const OutputConverter<T>& converter)
+      : low_(static_cast<double>(converter.low())),
+        high_(static_cast<double>(converter.high())),
+        avoids_(converter.avoids()),
+        noData_(static_cast<double>(converter.noData())),
+        replacement_(avoids_ ? static_cast<double>(converter.replacement()) : 0.0) {}
+
+  template <class D>
+  HWY_INLINE void Store(D d, hn::Vec<D> v, T* to) const {
+    const auto low = hn::Set(d, low_);
+    const auto high = hn::Set(d, high_);
+    const hn::Rebind<T, D> dt;
+    if constexpr (std::is_floating_point_v<T>) {
+      v = hn::IfThenElse(hn::Lt(v, low), low, hn::IfThenElse(hn::Gt(v, high), high, v));
+      if constexpr (std::is_same_v<T, double>) {
+        hn::StoreU(Avoid(d, v), dt, to);
+      } else {
+        auto narrow = hn::DemoteTo(dt, v);
+        if (avoids_) narrow = hn::DemoteTo(dt, Avoid(d, hn::PromoteTo(d, narrow)));
+        hn::StoreU(narrow, dt, to);
+      }
+    } else {
+      // NaN fails the comparison and becomes the low bound.
+      v = hn::IfThenElse(hn::Ge(v, low), v, low);
+      v = hn::IfThenElse(hn::Gt(v, high), high, v);
+      // Next to 1.5 * 2^52 the unit in the last place is 1: the sum rounds to the nearest integer,
+      // ties to even, and its low bits hold that integer.
+      const auto magic = hn::Set(d, 6755399441055744.0);
+      auto shifted = hn::Add(v, magic);
+      if (avoids_) {
+        shifted = hn::IfThenElse(hn::Eq(shifted, hn::Set(d, noData_ + 6755399441055744.0)),
+                                 hn::Set(d, replacement_ + 6755399441055744.0), shifted);
+      }
+      const hn::Rebind<std::make_unsigned_t<T>, D> du;
+      hn::StoreU(hn::TruncateTo(du, hn::BitCast(hn::RebindToUnsigned<D>(), shifted)), du,
+                 reinterpret_cast<std::make_unsigned_t<T>*>(to));
+    }
+  }
+
+ private:
+  template <class D>
+  HWY_INLINE hn::Vec<D> Avoid(D d, hn::Vec<D> v) const {
+    if (!avoids_) return v;
+    const auto touches = hn::Lt(hn::Abs(hn::Sub(v, hn::Set(d, noData_))), hn::Set(d, 1e-5));
+    return hn::IfThenElse(touches, hn::Set(d, replacement_), v);
+  }
+
+  double low_;
+  double high_;
+  bool avoids_;
+  double noData_;
+  double replacement_;
+};
+
+template <typename T>
+HWY_ATTR void Narrow(const double* values, std::size_t count, const OutputConverter<T>& converter,
+                     T* samples) {
+  const hn::ScalableTag<double> d;
+  const VectorConverter<T> convert(converter);
+  for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
+    convert.Store(d, hn::LoadU(d, values + i), samples + i);
+  }
+}
+
+HWY_ATTR void LookUp(std::uint8_t* bytes, std::size_t count, const std::uint8_t* table) {
+  const hn::ScalableTag<std::uint8_t> d;
+  for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
+    const auto v = hn::LoadU(d, bytes + i);
+    auto result = hn::Zero(d);
+    for (std::size_t part = 0; part < 256; part += 16) {
+      // 0 .. 15 for the bytes of this part, whose sum with 0x70 stays below 0x80; the lookup gives
+      // 0 for all others.
+      const auto own = hn::Xor(v, hn::Set(d, static_cast<std::uint8_t>(part)));
+      const auto index = hn::SaturatedAdd(own, hn::Set(d, 0x70));
+      result = hn::Or(result, hn::TableLookupBytesOr0(hn::LoadDup128(d, table + part), index));
+    }
+    hn::StoreU(result, d, bytes + i);
+  }
+}
+
+HWY_ATTR void StreamAligned(const std::byte* from, std::size_t size, std::byte* to) {
+  const hn::ScalableTag<std::uint8_t> d;
+  const auto* const source = reinterpret_cast<const std::uint8_t*>(from);
+  auto* const target = reinterpret_cast<std::uint8_t*>(to);
+  for (std::size_t i = 0; i < size; i += hn::Lanes(d)) {
+    hn::Stream(hn::LoadU(d, source + i), d, target + i);
+  }
+}
+
+// The dispatch table holds plain functions: one entry per sample type.
+#define ZARN_ROW_FUNCTIONS(name, T)                                                               \
+  void Split##name(const T* pixels, std::size_t count, std::size_t channels, T* planes,           \
+                   std::size_t pitch) {                                                           \
+    Split(pixels, count, channels, planes, pitch);                                                \
+  }                                                                                               \
+  void Join##name(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,    \
+                  const ExcludedPixels<T>& excluded, T* pixels) {                                 \
+    Join(planes, pitch, count, channels, excluded, pixels);                                       \
+  }                                                                                               \
+  bool Flag##name(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,    \
+                  const T* noData, const std::uint8_t* mask, std::uint8_t* flags) {               \
+    return Flag(planes, pitch, count, channels, noData, mask, flags);                             \
+  }                                                                                               \
+  void Widen##name(const T* samples, std::size_t count, double* values) {                         \
+    Widen(samples, count, values);                                                                \
+  }                                                                                               \
+  void Narrow##name(const double* values, std::size_t count, const OutputConverter<T>& converter, \
+                    T* samples) {                                                                 \
+    Narrow(values, count, converter, samples);                                                    \
+  }
+#define ZARN_SAMPLE_TYPES(macro)                                                         \
+  macro(UInt8, std::uint8_t) macro(Int8, std::int8_t) macro(UInt16, std::uint16_t)       \
+      macro(Int16, std::int16_t) macro(UInt32, std::uint32_t) macro(Int32, std::int32_t) \
+          macro(Float32, float) macro(Float64, double)
+ZARN_SAMPLE_TYPES(ZARN_ROW_FUNCTIONS)
+
+}  // namespace zarn::processes::filters::HWY_NAMESPACE
+HWY_AFTER_NAMESPACE();
+
+#if HWY_ONCE
+
+namespace zarn::processes::filters {
+
+// Explicit specialisations are exported unless told otherwise.
+#define ZARN_HIDDEN __attribute__((visibility("hidden")))
+#define ZARN_ROW_ENTRIES(name, T)                                                                 \
+  HWY_EXPORT(Split##name);                                                                        \
+  HWY_EXPORT(Join##name);                                                                         \
+  HWY_EXPORT(Flag##name);                                                                         \
+  HWY_EXPORT(Widen##name);                                                                        \
+  HWY_EXPORT(Narrow##name);                                                                       \
+  template <>                                                                                     \
+  ZARN_HIDDEN void SplitChannels(const T* pixels, std::size_t count, std::size_t channels,        \
+                                 T* planes, std::size_t pitch) {                                  \
+    HWY_DYNAMIC_DISPATCH(Split##name)(pixels, count, channels, planes, pitch);                    \
+  }                                                                                               \
+  template <>                                                                                     \
+  ZARN_HIDDEN void JoinChannels(const T* planes, std::size_t pitch, std::size_t count,            \
+                                std::size_t channels, const ExcludedPixels<T>& excluded,          \
+                                T* pixels) {                                                      \
+    HWY_DYNAMIC_DISPATCH(Join##name)(planes, pitch, count, channels, excluded, pixels);           \
+  }                                                                                               \
+  template <>                                                                                     \
+  ZARN_HIDDEN bool FlagExcluded(const T* planes, std::size_t pitch, std::size_t count,            \
+                                std::size_t channels, const T* noData, const std::uint8_t* mask,  \
+                                std::uint8_t* flags) {                                            \
+    return HWY_DYNAMIC_DISPATCH(Flag##name)(planes, pitch, count, channels, noData, mask, flags); \
+  }                                                                                               \
+  template <>                                                                                     \
+  ZARN_HIDDEN void WidenSamples(const T* samples, std::size_t count, double* values) {            \
+    HWY_DYNAMIC_DISPATCH(Widen##name)(samples, count, values);                                    \
+  }                                                                                               \
+  template <>                                                                                     \
+  ZARN_HIDDEN void NarrowSamples(const double* values, std::size_t count,                         \
+                                 const OutputConverter<T>& converter, T* samples) {               \
+    HWY_DYNAMIC_DISPATCH(Narrow##name)(values, count, converter, samples);                        \
+  }
+ZARN_SAMPLE_TYPES(ZARN_ROW_ENTRIES)
+
+HWY_EXPORT(Vectors);
+bool HasVectors() { return HWY_DYNAMIC_DISPATCH(Vectors)(); }
+
+HWY_EXPORT(LookUp);
+void LookUpBytes(std::uint8_t* bytes, std::size_t count, const std::uint8_t* table) {
+  HWY_DYNAMIC_DISPATCH(LookUp)(bytes, count, table);
+}
+
+HWY_EXPORT(StreamAligned);
+void StreamBytes(const std::byte* from, std::size_t size, std::byte* to) {
+  constexpr std::size_t kAlignment = 64;
+  const std::size_t past = reinterpret_cast<std::uintptr_t>(to) % kAlignment;
+  const std::size_t head = std::min(size, past == 0 ? 0 : kAlignment - past);
+  const std::size_t body = (size - head) / kAlignment * kAlignment;
+  std::memcpy(to, from, head);
+  HWY_DYNAMIC_DISPATCH(StreamAligned)(from + head, body, to + head);
+  std::memcpy(to + head + body, from + head + body, size - head - body);
+}
+
+void FinishStreaming() { hwy::FlushStream(); }
+
+}  // namespace zarn::processes::filters
+
+#endif  // HWY_ONCE

@@ -1,0 +1,59 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "processes/filters/framework/outputconverter.h"
+
+namespace zarn::processes::filters {
+
+/// Vector loops over runs of samples, for the eight sample types up to 32 bits and double. All rows
+/// are padded: they may be read and written up to this many elements past the length given.
+inline constexpr std::size_t kSampleRowPadding = 64;
+
+/// Whether this machine has vectors at all: emulated ones would be slower than plain loops.
+bool HasVectors();
+
+/// Channels of `count` interleaved pixels, those of channel c from `planes + c * pitch` on.
+template <typename T>
+void SplitChannels(const T* pixels, std::size_t count, std::size_t channels, T* planes,
+                   std::size_t pitch);
+
+/// What `JoinChannels` writes for pixels that are excluded.
+template <typename T>
+struct ExcludedPixels {
+  const std::uint8_t* flags = nullptr;  ///< one per pixel, not 0: excluded; null: none is
+  const T* value = nullptr;             ///< the pixel to write, or null for those of `old`
+  const T* old = nullptr;               ///< interleaved; looked at only without `value`
+};
+
+/// The inverse of `SplitChannels`.
+template <typename T>
+void JoinChannels(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
+                  const ExcludedPixels<T>& excluded, T* pixels);
+
+/// Flags the pixels whose mask byte is 0 or whose channels all equal `noData` (as
+/// `PixelNearlyEquals` has it) and tells whether there are any. Either pointer may be null.
+template <typename T>
+bool FlagExcluded(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
+                  const T* noData, const std::uint8_t* mask, std::uint8_t* flags);
+
+/// Samples as doubles.
+template <typename T>
+void WidenSamples(const T* samples, std::size_t count, double* values);
+
+/// `converter` applied to `count` values: the same bits.
+template <typename T>
+void NarrowSamples(const double* values, std::size_t count, const OutputConverter<T>& converter,
+                   T* samples);
+
+/// Replaces each byte by its entry in the table of 256.
+void LookUpBytes(std::uint8_t* bytes, std::size_t count, const std::uint8_t* table);
+
+/// Copies `size` bytes past the caches; for results that are too large to stay in them. The regions
+/// do not overlap. `FinishStreaming` comes before the thread lets others see them.
+void StreamBytes(const std::byte* from, std::size_t size, std::byte* to);
+void FinishStreaming();
+
+}  // namespace zarn::processes::filters

@@ -1,0 +1,77 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "processes/filters/normalization/hotspotnorm.h"
+
+#include <algorithm>
+#include <cstddef>
+
+#include "host/sys/vectorised.h"
+#include "processes/filters/colorbalance/balanceblock.h"
+
+namespace zarn::processes::filters {
+namespace {
+
+constexpr std::size_t kCoefficients = 6;
+
+double Surface(const double* p, double x, double y) {
+  return (y * p[1] + p[3] + x * p[0]) * x + y * p[2] * y + y * p[4] + p[5];
+}
+
+/// A channel's part of a run.
+ZARN_VECTORISED
+void BalanceRun(double* values, std::size_t count, std::uint32_t column, double columns, double y,
+                const double* coefficients) {
+  double p[kCoefficients];
+  std::copy_n(coefficients, kCoefficients, p);
+  for (std::size_t i = 0; i < count; ++i) {
+    const double x = static_cast<double>(column + static_cast<std::uint32_t>(i)) / columns;
+    values[i] = values[i] - Surface(p, x, y);
+  }
+}
+
+struct HotSpots {
+  void Run(const PixelRun& run) const {
+    const auto column = x0 + static_cast<std::uint32_t>(run.column);
+    const auto row = y0 + static_cast<std::uint32_t>(run.row);
+    const double y = static_cast<double>(row) / rows;
+    for (std::size_t c = 0; c < run.channels; ++c) {
+      BalanceRun(run.Channel(c), run.count, column, columns, y, coefficients[c].data());
+    }
+  }
+
+  const std::vector<double>* coefficients;
+  double columns;
+  double rows;
+  std::uint32_t x0;
+  std::uint32_t y0;
+};
+
+// Channels until the first one whose coefficients are not complete.
+std::size_t CompleteChannels(const std::vector<std::vector<double>>& coefficients) {
+  const auto incomplete =
+      std::find_if(coefficients.begin(), coefficients.end(),
+                   [](const std::vector<double>& row) { return row.size() < kCoefficients; });
+  return static_cast<std::size_t>(incomplete - coefficients.begin());
+}
+
+}  // namespace
+
+FilterResult CPUHotSpotNorm::Process(const gobs::Raster& input, gobs::Raster& output,
+                                     std::uint32_t blockX, std::uint32_t blockY,
+                                     const std::uint8_t* inputMask) {
+  const gobs::NativeDataTypeCode code = gobs::GetDataTypeCode(input);
+  const std::vector<ChannelBounds> bounds = TypeBounds(code, input.Channels());
+  return VisitBalanced(code, [&]<typename T>(std::type_identity<T>) {
+    if (auto refusal = CheckBalanced(input, output, inputNoData, outputNoData,
+                                     CompleteChannels(coefficients))) {
+      return *refusal;
+    }
+    const BalanceJob<T> job(input, output, inputNoData, outputNoData, inputMask,
+                            MakeConverters<T>(bounds, outputNoData));
+    const HotSpots correction{coefficients.data(), static_cast<double>(columnDivisor),
+                              static_cast<double>(rowDivisor), blockX, blockY};
+    Balance(job, ShareAlways(input), correction);
+    return FilterResult::Success();
+  });
+}
+
+}  // namespace zarn::processes::filters
