@@ -2,54 +2,13 @@
 #include "apps/zarn/neighbourhood.h"
 
 #include <algorithm>
-#include <charconv>
-#include <filesystem>
 #include <limits>
-#include <system_error>
 
-#include "apps/zarn/blockreader.h"
-#include "apps/zarn/blockwriter.h"
-#include "apps/zarn/dataset.h"
-#include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
-#include "apps/zarn/maskfile.h"
 #include "apps/zarn/nodata.h"
-#include "apps/zarn/progress.h"
-#include "apps/zarn/streamer.h"
-#include "host/sys/openmp.h"
 
 namespace zarn::app {
 namespace {
-
-namespace filters = processes::filters;
-
-std::optional<WindowSize> ParseWindow(const std::string& text) {
-  if (text.empty()) return std::nullopt;
-  WindowSize size;
-  const char* const end = text.data() + text.size();
-  const auto [cross, error] = std::from_chars(text.data(), end, size.width);
-  if (error == std::errc() && cross != end && *cross == 'x') {
-    const auto [rest, rowError] = std::from_chars(cross + 1, end, size.height);
-    const bool positive = size.width > 0 && size.height > 0;
-    if (rowError == std::errc() && rest == end && positive) return size;
-  }
-  throw UsageError("--window: '" + text + "' is not of the form COLSxROWS, for example 512x256");
-}
-
-// Refuses anything but digits; numbers beyond 64 bits saturate when they are converted.
-CLI::Validator WholeNumber(std::int64_t least, std::optional<std::int64_t> most) {
-  const std::string range = most ? " from " + std::to_string(least) + " to " + std::to_string(*most)
-                                 : " of at least " + std::to_string(least);
-  return CLI::Validator(
-      [=](const std::string& text) {
-        const bool digits = text.find_first_not_of("0123456789") == std::string::npos;
-        const double value = digits && !text.empty() ? std::stod(text) : -1;
-        const bool inRange =
-            value >= static_cast<double>(least) && (!most || value <= static_cast<double>(*most));
-        return inRange ? std::string() : "'" + text + "' is not a whole number" + range;
-      },
-      "");
-}
 
 // A window that reaches beyond the image on all sides sees the whole image, as does any larger one.
 int ClampedSize(std::int64_t size, const RasterSource& source) {
@@ -66,128 +25,36 @@ std::optional<double> ParseBackground(const std::string& text, const SampleType&
   return std::nullopt;
 }
 
-[[noreturn]] void FailFiltering(const RasterSource& source, const std::string& reason) {
-  throw RunError("cannot filter " + source.Name() + ": band " +
-                 std::to_string(source.Channels().front()) + " is " + source.Type().Name() + ": " +
-                 reason);
-}
-
-// The filter itself knows its sample types; one pixel asks it before anything is written.
-void RequireSampleType(const RasterSource& source, filters::IFilter& probe) {
-  using enum gobs::NativeDataTypeCode;
-  if (source.Type().code == kUnknown || source.Type().code == kNone) {
-    FailFiltering(source, "Unknown sample type.");
-  }
-  const gobs::RasterInfo pixel(1, 1, 1, source.Type().code);
-  gobs::Raster output(pixel);
-  const filters::FilterResult result = probe.Process(gobs::Raster(pixel), output, 0, 0, nullptr);
-  if (!result.Ok()) FailFiltering(source, result.message);
-}
-
-void RefuseMaskAsOutput(const NeighbourhoodOptions& options) {
-  std::error_code error;
-  if (std::filesystem::equivalent(options.mask, options.output.target, error)) {
-    throw UsageError("the output " + options.output.target +
-                     " is the mask file; name another output");
-  }
-}
-
 }  // namespace
 
 void AddNeighbourhoodOptions(CLI::App& command, NeighbourhoodOptions& options) {
-  const auto text = [&](const char* name, auto& value, const char* type, const char* description) {
-    return command.add_option(name, value, description)->type_name(type);
-  };
-  const auto number = [&](const char* name, auto& value, const char* type, std::int64_t least,
-                          std::optional<std::int64_t> most, const char* description) {
-    command.add_option(name, value, description)
-        ->type_name(type)
-        ->check(WholeNumber(least, most))
-        ->capture_default_str();
-  };
-  text("IN", options.input, "", "Raster to filter: anything that GDAL reads")->required();
-  text("OUT", options.output.target, "", "Raster to write")->required();
-  number("--size", options.size, "N", 1, std::nullopt,
-         "Side of the window in pixels; an even size acts as the next odd one");
-  text("--background", options.background, "V",
-       "Value of background pixels (all bands equal it), which enter no window and stay as they "
-       "are; "
-       "none by default");
-  text("--src-nodata", options.srcNoData, "V[,V...]",
-       "No-data value of IN, one for all bands or one for each, or 'none'; by default the file's "
-       "own");
-  text("--dst-nodata", options.dstNoData, "V[,V...]",
-       "No-data value of OUT, given to every invalid pixel, or 'none'; by default that of IN");
-  text("--mask", options.mask, "FILE",
-       "Raster of the same size; pixels where it is 0 enter no window and stay as they are");
-  text("--of", options.output.format, "FORMAT",
-       "GDAL format of OUT; by default by its extension, else GTiff");
-  text("--co", options.output.creation, "KEY=VALUE",
-       "Creation option of the format, repeatable; GTiff is by default tiled and compressed "
-       "(DEFLATE)")
-      ->allow_extra_args(false);
-  command.add_flag("--overwrite", options.output.overwrite, "Replace OUT if it exists");
-  number("--threads", options.threads, "N", 0, 4096,
-         "Threads for filtering and for compression each; 0 means all");
-  number("--memory", options.memory, "MIB", 1, std::int64_t{1} << 30,
-         "Memory for the windows in work");
-  text("--window", options.window, "COLSxROWS",
-       "Size of the pieces in which IN is worked through, instead of choosing it; the result does "
-       "not depend on it");
-  command.add_flag("-q,--quiet", options.quiet, "No progress and no warnings");
+  command
+      .add_option("--size", options.size,
+                  "Side of the window in pixels; an even size acts as the next odd one")
+      ->type_name("N")
+      ->check(WholeNumber(1, std::nullopt))
+      ->capture_default_str();
+  command
+      .add_option("--background", options.background,
+                  "Value of background pixels (all bands equal it), which enter no window and stay "
+                  "as they are; none by default")
+      ->type_name("V");
+  AddImageFilterOptions(
+      command, options.image,
+      "Raster of the same size; pixels where it is 0 enter no window and stay as they are");
 }
 
 void RunNeighbourhoodFilter(const NeighbourhoodOptions& options,
                             const NeighbourhoodFilterMaker& makeFilter) {
-  if (options.quiet) SilenceWarnings();
-  SetGdalThreads(options.threads);
-  const std::optional<WindowSize> forcedWindow = ParseWindow(options.window);
-
-  const RasterSource source(options.input);
-  source.RefusePalette();
-  RequireSampleType(source, *makeFilter(1, std::nullopt));
-  const NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
-  const int size = ClampedSize(options.size, source);
-  const std::unique_ptr<filters::IFilter> filter =
-      makeFilter(size, ParseBackground(options.background, source.Type()));
-  filter->SetNoDataValues(&noData.input, &noData.output);
-  std::optional<MaskFile> mask;
-  if (!options.mask.empty()) {
-    mask.emplace(options.mask, source);
-    RefuseMaskAsOutput(options);
-  }
-
-  StagedOutput output(options.output, source, noData.output);
-  const std::int64_t halo = size / 2;
-  BlockReader reader(source, mask ? &*mask : nullptr, noData, halo);
-  BlockWriter writer(source, output.Dataset(), output.Name());
-  int blockWidth = 1;
-  int blockHeight = 1;
-  output.Dataset().GetRasterBand(1)->GetBlockSize(&blockWidth, &blockHeight);
-  const WindowPlan plan({.image = {source.Width(), source.Height()},
-                         .outputBlock = {blockWidth, blockHeight},
-                         .halo = halo,
-                         .sampleBytes = reader.SampleBytes(),
-                         .sideBytes = reader.SideBytes(),
-                         .slots = kStreamSlots,
-                         .memory = static_cast<std::size_t>(options.memory) << 20,
-                         .forced = forcedWindow});
-  FitBlockCache(source, plan, halo);
-
-  const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
-                                                        : sys::OMPGetMaxThreads());
-  TerminalProgress progress(options.quiet);
-  ProgressSpan filtering(progress, 0, output.CopiesAtTheEnd() ? 0.5 : 0.99);
-  ProgressSpan publishing(progress, output.CopiesAtTheEnd() ? 0.5 : 0.99, 1);
-  StreamWindows(
-      source, plan, reader,
-      [&](const gobs::Raster& input, gobs::Raster& block, const std::uint8_t* valid) {
-        const filters::FilterResult result =
-            filter->Process(input, block, input.OriginX(), input.OriginY(), valid);
-        if (!result.Ok()) FailFiltering(source, result.message);
-      },
-      writer, filtering);
-  output.Publish(publishing);
+  RunImageFilter(options.image,
+                 {.probe = [&](const RasterSource&) { return makeFilter(1, std::nullopt); },
+                  .fit =
+                      [&](const RasterSource& source, const NoDataValues&) {
+                        const int size = ClampedSize(options.size, source);
+                        return FittedFilter{
+                            makeFilter(size, ParseBackground(options.background, source.Type())),
+                            size / 2};
+                      }});
 }
 
 }  // namespace zarn::app

@@ -8,24 +8,16 @@
 #include <optional>
 #include <string>
 
-#include "apps/zarn/stagedoutput.h"
+#include "apps/zarn/imagefilter.h"
 #include "processes/filters/framework/ifilter.h"
 
 namespace zarn::app {
 
 /// What the commands of the square-window filters share: `zarn <command> [options] IN OUT`.
 struct NeighbourhoodOptions {
-  std::string input;
-  OutputOptions output;
+  ImageFilterOptions image;
   std::int64_t size = 3;
   std::string background;
-  std::string srcNoData;
-  std::string dstNoData;
-  std::string mask;
-  std::string window;
-  std::int64_t memory = 256;  ///< MiB
-  int threads = 0;            ///< 0: all
-  bool quiet = false;
 };
 
 /// Declares the options on a subcommand.

@@ -1,0 +1,165 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/imagefilter.h"
+
+#include <charconv>
+#include <filesystem>
+#include <system_error>
+
+#include "apps/zarn/blockreader.h"
+#include "apps/zarn/blockwriter.h"
+#include "apps/zarn/errors.h"
+#include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/maskfile.h"
+#include "apps/zarn/progress.h"
+#include "apps/zarn/streamer.h"
+#include "host/sys/openmp.h"
+
+namespace zarn::app {
+namespace {
+
+namespace filters = processes::filters;
+
+std::optional<WindowSize> ParseWindow(const std::string& text) {
+  if (text.empty()) return std::nullopt;
+  WindowSize size;
+  const char* const end = text.data() + text.size();
+  const auto [cross, error] = std::from_chars(text.data(), end, size.width);
+  if (error == std::errc() && cross != end && *cross == 'x') {
+    const auto [rest, rowError] = std::from_chars(cross + 1, end, size.height);
+    const bool positive = size.width > 0 && size.height > 0;
+    if (rowError == std::errc() && rest == end && positive) return size;
+  }
+  throw UsageError("--window: '" + text + "' is not of the form COLSxROWS, for example 512x256");
+}
+
+[[noreturn]] void FailFiltering(const RasterSource& source, const std::string& reason) {
+  throw RunError("cannot filter " + source.Name() + ": band " +
+                 std::to_string(source.Channels().front()) + " is " + source.Type().Name() + ": " +
+                 reason);
+}
+
+// The filter itself knows its sample types; one pixel asks it before anything is written.
+void RequireSampleType(const RasterSource& source, filters::IFilter& probe) {
+  using enum gobs::NativeDataTypeCode;
+  if (source.Type().code == kUnknown || source.Type().code == kNone) {
+    FailFiltering(source, "Unknown sample type.");
+  }
+  const gobs::RasterInfo pixel(1, 1, 1, source.Type().code);
+  gobs::Raster output(pixel);
+  const filters::FilterResult result = probe.Process(gobs::Raster(pixel), output, 0, 0, nullptr);
+  if (!result.Ok()) FailFiltering(source, result.message);
+}
+
+void RefuseMaskAsOutput(const ImageFilterOptions& options) {
+  std::error_code error;
+  if (std::filesystem::equivalent(options.mask, options.output.target, error)) {
+    throw UsageError("the output " + options.output.target +
+                     " is the mask file; name another output");
+  }
+}
+
+}  // namespace
+
+CLI::Validator WholeNumber(std::int64_t least, std::optional<std::int64_t> most) {
+  const std::string range = most ? " from " + std::to_string(least) + " to " + std::to_string(*most)
+                                 : " of at least " + std::to_string(least);
+  return CLI::Validator(
+      [=](const std::string& text) {
+        const bool digits = text.find_first_not_of("0123456789") == std::string::npos;
+        const double value = digits && !text.empty() ? std::stod(text) : -1;
+        const bool inRange =
+            value >= static_cast<double>(least) && (!most || value <= static_cast<double>(*most));
+        return inRange ? std::string() : "'" + text + "' is not a whole number" + range;
+      },
+      "");
+}
+
+void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
+                           const std::string& maskHelp) {
+  const auto text = [&](const char* name, auto& value, const char* type,
+                        const std::string& description) {
+    return command.add_option(name, value, description)->type_name(type);
+  };
+  const auto number = [&](const char* name, auto& value, const char* type, std::int64_t least,
+                          std::optional<std::int64_t> most, const char* description) {
+    command.add_option(name, value, description)
+        ->type_name(type)
+        ->check(WholeNumber(least, most))
+        ->capture_default_str();
+  };
+  text("IN", options.input, "", "Raster to filter: anything that GDAL reads")->required();
+  text("OUT", options.output.target, "", "Raster to write")->required();
+  text("--src-nodata", options.srcNoData, "V[,V...]",
+       "No-data value of IN, one for all bands or one for each, or 'none'; by default the file's "
+       "own");
+  text("--dst-nodata", options.dstNoData, "V[,V...]",
+       "No-data value of OUT, given to every invalid pixel, or 'none'; by default that of IN");
+  text("--mask", options.mask, "FILE", maskHelp);
+  text("--of", options.output.format, "FORMAT",
+       "GDAL format of OUT; by default by its extension, else GTiff");
+  text("--co", options.output.creation, "KEY=VALUE",
+       "Creation option of the format, repeatable; GTiff is by default tiled and compressed "
+       "(DEFLATE)")
+      ->allow_extra_args(false);
+  command.add_flag("--overwrite", options.output.overwrite, "Replace OUT if it exists");
+  number("--threads", options.threads, "N", 0, 4096,
+         "Threads for filtering and for compression each; 0 means all");
+  number("--memory", options.memory, "MIB", 1, std::int64_t{1} << 30,
+         "Memory for the windows in work");
+  text("--window", options.window, "COLSxROWS",
+       "Size of the pieces in which IN is worked through, instead of choosing it; the result does "
+       "not depend on it");
+  command.add_flag("-q,--quiet", options.quiet, "No progress and no warnings");
+}
+
+void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker) {
+  if (options.quiet) SilenceWarnings();
+  SetGdalThreads(options.threads);
+  const std::optional<WindowSize> forcedWindow = ParseWindow(options.window);
+
+  const RasterSource source(options.input);
+  source.RefusePalette();
+  RequireSampleType(source, *maker.probe(source));
+  const NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
+  const FittedFilter fitted = maker.fit(source, noData);
+  filters::IFilter& filter = *fitted.filter;
+  filter.SetNoDataValues(&noData.input, &noData.output);
+  std::optional<MaskFile> mask;
+  if (!options.mask.empty()) {
+    mask.emplace(options.mask, source);
+    RefuseMaskAsOutput(options);
+  }
+
+  StagedOutput output(options.output, source, noData.output);
+  BlockReader reader(source, mask ? &*mask : nullptr, noData, fitted.halo);
+  BlockWriter writer(source, output.Dataset(), output.Name());
+  int blockWidth = 1;
+  int blockHeight = 1;
+  output.Dataset().GetRasterBand(1)->GetBlockSize(&blockWidth, &blockHeight);
+  const WindowPlan plan({.image = {source.Width(), source.Height()},
+                         .outputBlock = {blockWidth, blockHeight},
+                         .halo = fitted.halo,
+                         .sampleBytes = reader.SampleBytes(),
+                         .sideBytes = reader.SideBytes(),
+                         .slots = kStreamSlots,
+                         .memory = static_cast<std::size_t>(options.memory) << 20,
+                         .forced = forcedWindow});
+  FitBlockCache(source, plan, fitted.halo);
+
+  const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
+                                                        : sys::OMPGetMaxThreads());
+  TerminalProgress progress(options.quiet);
+  ProgressSpan filtering(progress, 0, output.CopiesAtTheEnd() ? 0.5 : 0.99);
+  ProgressSpan publishing(progress, output.CopiesAtTheEnd() ? 0.5 : 0.99, 1);
+  StreamWindows(
+      source, plan, reader,
+      [&](const gobs::Raster& input, gobs::Raster& block, const std::uint8_t* valid) {
+        const filters::FilterResult result =
+            filter.Process(input, block, input.OriginX(), input.OriginY(), valid);
+        if (!result.Ok()) FailFiltering(source, result.message);
+      },
+      writer, filtering);
+  output.Publish(publishing);
+}
+
+}  // namespace zarn::app
