@@ -25,6 +25,23 @@ void CarryRows(const Plane& above, std::int64_t rows, Plane& plane) {
   if (bytes > 0) std::memcpy(plane.Data(), above.Data() + above.Size() - bytes, bytes);
 }
 
+// Some filters handle 64-bit integers beside the types of `VisitSampleType`; what no filter handles
+// has been refused before.
+template <typename Visitor>
+void VisitAnySampleType(gobs::NativeDataTypeCode code, const Visitor& visit) {
+  using enum gobs::NativeDataTypeCode;
+  if (code == kInt64) {
+    visit(std::type_identity<std::int64_t>{});
+  } else if (code == kUInt64) {
+    visit(std::type_identity<std::uint64_t>{});
+  } else {
+    filters::VisitSampleType(code, "", [&](auto type) {
+      visit(type);
+      return filters::FilterResult::Success();
+    });
+  }
+}
+
 // The rules for one row of pixels; a NaN or an excluded pixel is one as a whole.
 template <typename T>
 class ValidityRow {
@@ -219,7 +236,7 @@ void BlockReader::MarkValid(const Fresh& fresh, WindowBuffers& buffers) {
   };
   forEachRow([&](std::uint8_t* valid, std::int64_t) { std::fill_n(valid, width, 1); });
 
-  filters::VisitSampleType(source_.Type().code, "", [&]<typename T>(std::type_identity<T>) {
+  VisitAnySampleType(source_.Type().code, [&]<typename T>(std::type_identity<T>) {
     const ValidityRow<T> rules(source_.Channels().size(), source_.Alphas().size(), noData_);
     const auto samples = [&](std::int64_t y) {
       return reinterpret_cast<T*>(buffers.samples.At(fresh.column, y));
@@ -246,7 +263,6 @@ void BlockReader::MarkValid(const Fresh& fresh, WindowBuffers& buffers) {
         rules.TranslateNoData(valid, samples(y), width);
       });
     }
-    return filters::FilterResult::Success();
   });
 }
 

@@ -4,8 +4,11 @@
 #include <cpl_string.h>
 
 #include <algorithm>
+#include <cstdint>
 #include <functional>
 #include <sstream>
+
+#include "host/gobs/saturatecast.h"
 
 namespace zarn::app {
 namespace {
@@ -54,6 +57,19 @@ void CopyBand(GDALRasterBand& source, GDALRasterBand& output) {
   if (source.GetUnitType()[0] != '\0') output.SetUnitType(source.GetUnitType());
 }
 
+void DeclareNoData(GDALRasterBand& band, double value) {
+  switch (band.GetRasterDataType()) {
+    case GDT_Int64:
+      band.SetNoDataValueAsInt64(gobs::SaturateCast<std::int64_t>(value));
+      break;
+    case GDT_UInt64:
+      band.SetNoDataValueAsUInt64(gobs::SaturateCast<std::uint64_t>(value));
+      break;
+    default:
+      band.SetNoDataValue(value);
+  }
+}
+
 void DeclareNoData(const RasterSource& source, const std::vector<double>& values,
                    GDALDataset& output) {
   if (values.empty()) return;
@@ -61,7 +77,7 @@ void DeclareNoData(const RasterSource& source, const std::vector<double>& values
       std::adjacent_find(values.begin(), values.end(), std::not_equal_to<>()) == values.end();
   if (equal || values.size() == 1) {
     for (const int number : source.Channels()) {
-      output.GetRasterBand(number)->SetNoDataValue(values.front());
+      DeclareNoData(*output.GetRasterBand(number), values.front());
     }
     return;
   }

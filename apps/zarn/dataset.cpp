@@ -5,6 +5,7 @@
 #include <cpl_string.h>
 
 #include <cstdlib>
+#include <optional>
 #include <string>
 
 #include "apps/zarn/errors.h"
@@ -45,6 +46,22 @@ gobs::NativeDataTypeCode CodeOf(GDALDataType type) {
     default:
       return kUnknown;
   }
+}
+
+std::optional<double> DeclaredNoData(GDALRasterBand& band) {
+  int declared = FALSE;
+  double value = 0;
+  switch (band.GetRasterDataType()) {
+    case GDT_Int64:
+      value = static_cast<double>(band.GetNoDataValueAsInt64(&declared));
+      break;
+    case GDT_UInt64:
+      value = static_cast<double>(band.GetNoDataValueAsUInt64(&declared));
+      break;
+    default:
+      value = band.GetNoDataValue(&declared);
+  }
+  return declared != FALSE ? std::optional(value) : std::nullopt;
 }
 
 }  // namespace
@@ -117,9 +134,8 @@ void RasterSource::ReadNoData() {
     return;
   }
   for (const int number : channels_) {
-    int declared = FALSE;
-    const double value = dataset_->GetRasterBand(number)->GetNoDataValue(&declared);
-    if (declared != FALSE) noData_.push_back(value);
+    const std::optional<double> value = DeclaredNoData(*dataset_->GetRasterBand(number));
+    if (value) noData_.push_back(*value);
   }
   if (!noData_.empty() && noData_.size() < channels_.size()) {
     Warn(name_ + " declares a no-data value for only " + std::to_string(noData_.size()) + " of " +

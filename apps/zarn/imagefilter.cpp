@@ -12,6 +12,7 @@
 #include "apps/zarn/maskfile.h"
 #include "apps/zarn/progress.h"
 #include "apps/zarn/streamer.h"
+#include "host/core/exception.h"
 #include "host/sys/openmp.h"
 
 namespace zarn::app {
@@ -46,7 +47,13 @@ void RequireSampleType(const RasterSource& source, filters::IFilter& probe) {
   }
   const gobs::RasterInfo pixel(1, 1, 1, source.Type().code);
   gobs::Raster output(pixel);
-  const filters::FilterResult result = probe.Process(gobs::Raster(pixel), output, 0, 0, nullptr);
+  filters::FilterResult result;
+  try {
+    result = probe.Process(gobs::Raster(pixel), output, 0, 0, nullptr);
+  } catch (const Exception& refusal) {
+    // Filters that look their type up in a list refuse it in this way.
+    result = filters::FilterResult::Failure(refusal.Message());
+  }
   if (!result.Ok()) FailFiltering(source, result.message);
 }
 

@@ -10,8 +10,13 @@
 
 #include "apps/zarn/average.h"
 #include "apps/zarn/errors.h"
+#include "apps/zarn/gainoffset.h"
 #include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/hotspot.h"
 #include "apps/zarn/interruption.h"
+#include "apps/zarn/lut.h"
+#include "apps/zarn/minmaxlut.h"
+#include "apps/zarn/polynomial.h"
 #include "apps/zarn/sample.h"
 
 namespace {
@@ -37,6 +42,11 @@ void AddCommands(CLI::App& app) {
       "'zarn COMMAND --help' shows the options of a command.\n\n"
       "Example:\n  zarn average --size 5 scene.tif smooth.tif");
   zarn::app::AddAverageCommand(app);
+  zarn::app::AddGainOffsetCommand(app);
+  zarn::app::AddLutCommand(app);
+  zarn::app::AddMinMaxLutCommand(app);
+  zarn::app::AddPolynomialCommand(app);
+  zarn::app::AddHotSpotCommand(app);
   zarn::app::AddSampleCommand(app);
 }
 
@@ -57,7 +67,7 @@ int RunCommand(int argc, char** argv) {
   } catch (const zarn::app::UsageError& error) {
     return Fail(kWrongUsage, error.what());
   } catch (const std::bad_alloc&) {
-    return Fail(kRunFailed, "out of memory; try a smaller --memory or --size");
+    return Fail(kRunFailed, "out of memory; try a smaller --memory");
   } catch (const std::exception& error) {
     return Fail(kRunFailed, error.what());
   }

@@ -8,6 +8,7 @@
 #include <sstream>
 #include <string>
 
+#include "apps/zarn/channellist.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
 #include "host/gobs/datatypeadapter.h"
@@ -22,15 +23,10 @@ std::string ToText(double value) {
   return text.str();
 }
 
-std::vector<double> OnePerChannel(const RasterSource& source, const std::string& option,
-                                  const std::vector<double>& values) {
-  const std::size_t channels = source.Channels().size();
-  if (values.size() == 1) return std::vector<double>(channels, values.front());
-  if (values.empty() || values.size() == channels) return values;
-  throw UsageError(option + " has " + std::to_string(values.size()) + " values, but " +
-                   source.Name() + " has " + std::to_string(channels) + " bands" +
-                   (source.Alphas().empty() ? "" : " besides alpha") +
-                   "; give one value or one per band");
+// No-data is the pixel as a whole, so there is a value for every channel or none at all.
+std::vector<double> ForAllChannels(const RasterSource& source, const std::string& option,
+                                   const std::vector<double>& values) {
+  return values.empty() ? values : OnePerChannel(source, option, "values", values);
 }
 
 // The list, or none when a value can never occur: no pixel can then equal it in all channels.
@@ -56,10 +52,8 @@ double ParseNumber(const std::string& option, const std::string& text) {
   return value;
 }
 
-std::optional<std::vector<double>> ParseNoData(const std::string& option, const std::string& text) {
-  if (text.empty()) return std::nullopt;
+std::vector<double> ParseNumbers(const std::string& option, const std::string& text) {
   std::vector<double> values;
-  if (text == "none") return values;
   for (std::size_t begin = 0; begin <= text.size();) {
     const std::size_t end = std::min(text.find(',', begin), text.size());
     values.push_back(ParseNumber(option, text.substr(begin, end - begin)));
@@ -68,14 +62,23 @@ std::optional<std::vector<double>> ParseNoData(const std::string& option, const 
   return values;
 }
 
+std::optional<std::vector<double>> ParseNoData(const std::string& option, const std::string& text) {
+  if (text.empty()) return std::nullopt;
+  if (text == "none") return std::vector<double>();
+  return ParseNumbers(option, text);
+}
+
 bool CanHold(gobs::NativeDataTypeCode code, double value) {
   using enum gobs::NativeDataTypeCode;
   // Half a step beyond the largest float still rounds to it.
   constexpr double kPastLargestFloat = 0x1.ffffffp+127;
   if (code == kFloat64) return true;
   if (code == kFloat32) return !std::isfinite(value) || std::abs(value) < kPastLargestFloat;
-  return value == std::trunc(value) && value >= gobs::DataTypeAdapter::MinValue(code) &&
-         value <= gobs::DataTypeAdapter::MaxValue(code);
+  const double least = gobs::DataTypeAdapter::MinValue(code);
+  const double most = gobs::DataTypeAdapter::MaxValue(code);
+  // Beyond 2^53 a double stands for several 64-bit integers, except for the type's own limits.
+  if (std::abs(value) >= 0x1p53) return value == least || value == most;
+  return value == std::trunc(value) && value >= least && value <= most;
 }
 
 NoDataValues ResolveNoData(const RasterSource& source, const std::string& srcOption,
@@ -83,11 +86,12 @@ NoDataValues ResolveNoData(const RasterSource& source, const std::string& srcOpt
   NoDataValues result;
   const auto src = ParseNoData("--src-nodata", srcOption);
   const auto dst = ParseNoData("--dst-nodata", dstOption);
-  result.input = src ? Holdable(source, "--src-nodata", OnePerChannel(source, "--src-nodata", *src))
-                     : Holdable(source, source.Name() + ": no-data value", source.NoData());
+  result.input =
+      src ? Holdable(source, "--src-nodata", ForAllChannels(source, "--src-nodata", *src))
+          : Holdable(source, source.Name() + ": no-data value", source.NoData());
   result.output = result.input;
   if (dst) {
-    result.output = Holdable(source, "--dst-nodata", OnePerChannel(source, "--dst-nodata", *dst));
+    result.output = Holdable(source, "--dst-nodata", ForAllChannels(source, "--dst-nodata", *dst));
     result.translate = !result.output.empty();
   }
   return result;

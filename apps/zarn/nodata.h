@@ -12,7 +12,10 @@ namespace zarn::app {
 /// A number of the command line; throws `UsageError` naming `option`.
 double ParseNumber(const std::string& option, const std::string& text);
 
-/// A list "V[,V...]" of the command line; "none" is the empty list. Nothing when `text` is empty,
+/// A list "V[,V...]" of the command line, of at least one number.
+std::vector<double> ParseNumbers(const std::string& option, const std::string& text);
+
+/// A list as `ParseNumbers` takes it; "none" is the empty list. Nothing when `text` is empty,
 /// that is, when the option was not given.
 std::optional<std::vector<double>> ParseNoData(const std::string& option, const std::string& text);
 

@@ -111,12 +111,16 @@ bool OutputFormat::WritesBlocks() const { return Has(*driver_, GDAL_DCAP_CREATE)
 void OutputFormat::RequireSamples(const SampleType& type) const {
   const char* const types = driver_->GetMetadataItem(GDAL_DMD_CREATIONDATATYPES);
   const char* const options = driver_->GetMetadataItem(GDAL_DMD_CREATIONOPTIONLIST);
+  const bool isGeoTiff = EQUAL(driver_->GetDescription(), "GTiff");
   const bool copiesSignedBytes = EQUAL(driver_->GetDescription(), "COG");
+  // GDAL 3.6 leaves 64-bit integers out of GeoTIFF's list, though it writes them.
+  const bool unlisted = isGeoTiff && (type.gdal == GDT_Int64 || type.gdal == GDT_UInt64);
   const bool holds =
       type.IsSignedByte()
           ? copiesSignedBytes || (options != nullptr && strstr(options, "SIGNEDBYTE") != nullptr)
-          : types == nullptr || CPLStringList(CSLTokenizeString2(types, " ", 0))
-                                        .FindString(GDALGetDataTypeName(type.gdal)) >= 0;
+          : types == nullptr || unlisted ||
+                CPLStringList(CSLTokenizeString2(types, " ", 0))
+                        .FindString(GDALGetDataTypeName(type.gdal)) >= 0;
   if (!holds) {
     throw RunError("the format " + Name() + " cannot hold " + type.Name() +
                    " samples; choose another with --of");

@@ -90,19 +90,24 @@ class Chooser {
     }
   }
 
+  // What to make smaller; without a halo the window alone decides.
+  std::string Culprit() const {
+    if (request_.halo == 0) return "--window";
+    return request_.forced ? "--window or --size" : "--size";
+  }
+
   [[noreturn]] void Refuse(WindowSize smallest) const {
     const auto mebibytes = [](double bytes) {
       return std::to_string(static_cast<std::int64_t>(std::ceil(bytes / (1 << 20)))) + " MiB";
     };
     if (BlockBytes(smallest) > kMaxBlockBytes) {
       throw RunError("a window with its margins would take " + mebibytes(BlockBytes(smallest)) +
-                     ", more than the 4095 MiB that a block may have; use a smaller " +
-                     (request_.forced ? "--window or --size" : "--size"));
+                     ", more than the 4095 MiB that a block may have; use a smaller " + Culprit());
     }
     throw RunError("the windows with their margins would take " + mebibytes(TotalBytes(smallest)) +
                    ", more than --memory allows (" +
                    mebibytes(static_cast<double>(request_.memory)) + "); use a smaller " +
-                   (request_.forced ? "--window or --size" : "--size") + " or more --memory");
+                   Culprit() + " or more --memory");
   }
 
   const WindowRequest& request_;

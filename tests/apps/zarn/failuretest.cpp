@@ -3,7 +3,6 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <chrono>
 #include <filesystem>
 #include <fstream>
@@ -19,15 +18,6 @@ namespace {
 
 namespace fs = std::filesystem;
 using Arguments = std::vector<std::string>;
-
-void ExpectOneLine(const Outcome& outcome, int status, const std::string& part) {
-  EXPECT_EQ(outcome.status, status);
-  EXPECT_TRUE(outcome.err.starts_with("zarn: ")) << outcome.err;
-  EXPECT_EQ(std::count(outcome.err.begin(), outcome.err.end(), '\n'), 1) << outcome.err;
-  EXPECT_NE(outcome.err.find(part), std::string::npos)
-      << "'" << part << "' is not in: " << outcome.err;
-  EXPECT_EQ(outcome.out, "");
-}
 
 // One of everything that can be wrong with an input.
 void WriteInputs(const TemporaryFolder& folder) {

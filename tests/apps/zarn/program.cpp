@@ -2,12 +2,14 @@
 #include "tests/apps/zarn/program.h"
 
 #include <fcntl.h>
+#include <gtest/gtest.h>
 #include <signal.h>
 #include <stdlib.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <stdexcept>
 #include <string>
 #include <system_error>
@@ -79,6 +81,15 @@ Outcome Program::Wait() {
 
 Outcome RunProgram(const std::vector<std::string>& arguments, std::uint64_t largestFile) {
   return Program(arguments, largestFile).Wait();
+}
+
+void ExpectOneLine(const Outcome& outcome, int status, const std::string& part) {
+  EXPECT_EQ(outcome.status, status);
+  EXPECT_TRUE(outcome.err.starts_with("zarn: ")) << outcome.err;
+  EXPECT_EQ(std::count(outcome.err.begin(), outcome.err.end(), '\n'), 1) << outcome.err;
+  EXPECT_NE(outcome.err.find(part), std::string::npos)
+      << "'" << part << "' is not in: " << outcome.err;
+  EXPECT_EQ(outcome.out, "");
 }
 
 TemporaryFolder::TemporaryFolder() {

@@ -39,6 +39,9 @@ class Program {
 
 Outcome RunProgram(const std::vector<std::string>& arguments, std::uint64_t largestFile = 0);
 
+/// A failure must say in one line what is wrong, with `part` in it, and print nothing else.
+void ExpectOneLine(const Outcome& outcome, int status, const std::string& part);
+
 /// A folder that vanishes at the end of a test.
 class TemporaryFolder {
  public:

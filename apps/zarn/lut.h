@@ -1,0 +1,25 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace zarn::app {
+
+/// Entries of a look-up table, one for each value of a byte.
+inline constexpr std::size_t kTableSize = 256;
+using LookUpTable = std::vector<std::uint8_t>;
+
+/// A table that brightens the middle tones a little, as the list of a parameter file.
+std::string ExampleTable();
+
+/// The tables as the factories take them, which copy them.
+std::vector<unsigned char*> PointersTo(std::vector<LookUpTable>& tables);
+
+/// Adds the command `lut` to the program.
+void AddLutCommand(CLI::App& app);
+
+}  // namespace zarn::app
