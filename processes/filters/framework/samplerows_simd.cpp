@@ -187,6 +187,9 @@ HWY_ATTR void Narrow(const double* values, std::size_t count, const OutputConver
 }
 
 HWY_ATTR void LookUp(std::uint8_t* bytes, std::size_t count, const std::uint8_t* table) {
+#if HWY_TARGET == HWY_SCALAR || HWY_TARGET == HWY_EMU128
+  for (std::size_t i = 0; i < count; ++i) bytes[i] = table[bytes[i]];
+#else
   const hn::ScalableTag<std::uint8_t> d;
   for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
     const auto v = hn::LoadU(d, bytes + i);
@@ -200,6 +203,7 @@ HWY_ATTR void LookUp(std::uint8_t* bytes, std::size_t count, const std::uint8_t*
     }
     hn::StoreU(result, d, bytes + i);
   }
+#endif
 }
 
 HWY_ATTR void StreamAligned(const std::byte* from, std::size_t size, std::byte* to) {
