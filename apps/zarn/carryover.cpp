@@ -4,8 +4,8 @@
 #include <cpl_string.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdint>
-#include <functional>
 #include <sstream>
 
 #include "host/gobs/saturatecast.h"
@@ -73,8 +73,11 @@ void DeclareNoData(GDALRasterBand& band, double value) {
 void DeclareNoData(const RasterSource& source, const std::vector<double>& values,
                    GDALDataset& output) {
   if (values.empty()) return;
-  const bool equal =
-      std::adjacent_find(values.begin(), values.end(), std::not_equal_to<>()) == values.end();
+  // Like the filters, it takes NaN for one value.
+  const auto differ = [](double a, double b) {
+    return a != b && !(std::isnan(a) && std::isnan(b));
+  };
+  const bool equal = std::adjacent_find(values.begin(), values.end(), differ) == values.end();
   if (equal || values.size() == 1) {
     for (const int number : source.Channels()) {
       DeclareNoData(*output.GetRasterBand(number), values.front());

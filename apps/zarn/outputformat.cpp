@@ -65,6 +65,8 @@ void AddCompression(CPLStringList& options, const SampleType& type) {
   // The lowest level: files grow by three per cent against the usual one, in a third of the time.
   options.SetNameValue("COMPRESS", "DEFLATE");
   setDefault("ZLEVEL", "1");
+  // It works on whole bytes, so not on samples of the caller's own number of bits.
+  if (options.FetchNameValue("NBITS") != nullptr) return;
   setDefault("PREDICTOR", GDALDataTypeIsFloating(type.gdal) != FALSE ? "3" : "2");
 }
 

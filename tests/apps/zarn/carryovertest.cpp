@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 #include <ogr_spatialref.h>
 
+#include <cmath>
 #include <fstream>
 #include <string>
 
@@ -110,6 +111,37 @@ TEST(CarryOver, KeepsGroundControlPointsColoursAndCameraModels) {
   EXPECT_EQ(std::stod(output->GetMetadataItem("LAT_OFF", "RPC")), 42);
 }
 
+TEST(CarryOver, DeclaresNoDataOnEveryBandAlsoWhereItIsNaN) {
+  const TemporaryFolder folder;
+  for (const bool declared : {true, false}) {
+    Write(NoiseImage(20, 20, 2, GDT_Float32, {}, 1), folder / (declared ? "nan.tif" : "none.tif"),
+          {}, declared ? DeclareNoData(std::nan("")) : Decorate());
+  }
+  struct Case {
+    const char* input;
+    std::vector<std::string> options;
+  };
+  const std::vector<Case> cases{{"nan.tif", {}},
+                                {"nan.tif", {"--of", "COG"}},
+                                {"none.tif", {"--src-nodata", "nan"}},
+                                {"none.tif", {"--dst-nodata", "nan"}},
+                                {"none.tif", {"--dst-nodata", "nan,nan"}}};
+  for (const Case& c : cases) {
+    std::vector<std::string> arguments{"average", "--overwrite", folder / c.input,
+                                       folder / "out.tif"};
+    arguments.insert(arguments.begin() + 1, c.options.begin(), c.options.end());
+    SCOPED_TRACE(std::string(c.input) + (c.options.empty() ? "" : " " + c.options.back()));
+    ASSERT_EQ(RunProgram(arguments).status, 0);
+    const OpenDataset output = OpenImage(folder / "out.tif");
+    for (const int band : {1, 2}) {
+      int has = FALSE;
+      EXPECT_TRUE(std::isnan(output->GetRasterBand(band)->GetNoDataValue(&has)));
+      EXPECT_EQ(has, TRUE);
+    }
+    EXPECT_EQ(output->GetMetadataItem("NODATA_VALUES"), nullptr);
+  }
+}
+
 TEST(CarryOver, DropsTheStaleCompanionsOfAReplacedFile) {
   const TemporaryFolder folder;
   Write(NoiseImage(20, 20, 1, GDT_Byte, {}, 1), folder / "in.tif");
@@ -141,6 +173,9 @@ TEST(CarryOver, WritesTheGeoTiffThatWasAskedFor) {
   EXPECT_EQ(layout({"--co", "compress=none", "--co", "TILED=NO", "--co", "BLOCKYSIZE=3"}),
             "none 600x3");
   EXPECT_EQ(layout({"--co", "COMPRESS=LZW"}), "LZW 256x256");
+  // Samples of 12 bits, which the predictor cannot be used with.
+  Write(NoiseImage(600, 300, 1, GDT_UInt16, {}, 1), folder / "in.tif");
+  EXPECT_EQ(layout({"--co", "NBITS=12"}), "DEFLATE 256x256");
 }
 
 }  // namespace
