@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstdio>
 #include <exception>
+#include <memory>
 #include <new>
 #include <string>
 
@@ -12,6 +13,7 @@
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gainoffset.h"
 #include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/helpformatter.h"
 #include "apps/zarn/hotspot.h"
 #include "apps/zarn/interruption.h"
 #include "apps/zarn/lut.h"
@@ -50,9 +52,23 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddSampleCommand(app);
 }
 
+// A variable of a script that was never set must not silently stand for "not given".
+void RefuseEmptyValues(CLI::App& app) {
+  const CLI::Validator notEmpty(
+      [](const std::string& text) {
+        return text.empty() ? "it is empty; give a value or leave it out" : std::string();
+      },
+      "");
+  for (CLI::App* const command : app.get_subcommands({})) {
+    for (CLI::Option* const option : command->get_options()) option->check(notEmpty);
+  }
+}
+
 int RunCommand(int argc, char** argv) {
   CLI::App app("Filters rasters of any size, in the manner of the GDAL tools.", "zarn");
+  app.formatter(std::make_shared<zarn::app::HelpFormatter>());
   AddCommands(app);
+  RefuseEmptyValues(app);
   const zarn::app::GdalRuntime gdal;
   try {
     app.parse(argc, argv);

@@ -41,6 +41,11 @@ std::vector<double> Holdable(const RasterSource& source, const std::string& orig
   return values;
 }
 
+void RefuseNoneAmongNumbers(const std::string& option, const std::string& list) {
+  if (("," + list + ",").find(",none,") == std::string::npos) return;
+  throw UsageError(option + ": 'none' must stand alone, it means no no-data value for all bands");
+}
+
 }  // namespace
 
 double ParseNumber(const std::string& option, const std::string& text) {
@@ -65,6 +70,7 @@ std::vector<double> ParseNumbers(const std::string& option, const std::string& t
 std::optional<std::vector<double>> ParseNoData(const std::string& option, const std::string& text) {
   if (text.empty()) return std::nullopt;
   if (text == "none") return std::vector<double>();
+  RefuseNoneAmongNumbers(option, text);
   return ParseNumbers(option, text);
 }
 

@@ -60,7 +60,7 @@ constexpr std::array<FileEntry, kFiles> kEntries{{
     {"truth_u16.tif", "the same, 12 of 16 bits"},
     {"scene1_u8.tif", "left scene: hazy, hot spot, outliers, no-data collar, 8 bits"},
     {"scene1_u16.tif", "the same, 12 of 16 bits"},
-    {"scene2_u8.tif", "right scene, overlapping the left one: other colours, hot spot, 8 bits"},
+    {"scene2_u8.tif", "right scene, overlapping: other colours, hot spot, 8 bits"},
     {"scene2_u16.tif", "the same, 12 of 16 bits"},
     {"cutline.gpkg", "polygon through which scene 2 is pasted onto scene 1"},
     {"sample.json", "what disturbs the scenes: gain, offset, hot spot, noise"},
@@ -309,8 +309,8 @@ void AddSampleCommand(CLI::App& app) {
   });
   std::string footer =
       "Two overlapping scenes of the same farmland, each with its own colours, a hot spot, "
-      "outliers, noise and a\nno-data collar (0), with the undisturbed truth beside them. The same "
-      "seed gives the same pixels everywhere.\nFiles:\n";
+      "outliers, noise and a no-data collar (0), with the undisturbed truth beside them. The same "
+      "seed gives the same pixels everywhere.\n\nFiles:\n";
   for (const FileEntry& entry : kEntries) {
     footer += "  " + std::string(entry.name) +
               std::string(16 - std::string(entry.name).size(), ' ') + entry.purpose + "\n";

@@ -6,6 +6,7 @@
 #include <chrono>
 #include <filesystem>
 #include <fstream>
+#include <sstream>
 #include <string>
 #include <thread>
 #include <vector>
@@ -91,6 +92,8 @@ TEST(WrongInput, EndsInOneLineAndLeavesNothing) {
       {{"--src-nodata", "1,2", good, out}, 2, "has 2 values, but"},
       {{"--dst-nodata", "1,2,3,4", good, out}, 2, "has 3 bands"},
       {{"--src-nodata", "water", good, out}, 2, "'water'"},
+      {{"--src-nodata", "0,0,none", good, out}, 2, "--src-nodata: 'none' must stand alone"},
+      {{"--dst-nodata", "none,0,0", good, out}, 2, "--dst-nodata: 'none' must stand alone"},
       {{"--background", "1,2,3", good, out}, 2, "--background"},
       {{"--window", "7", good, out}, 2, "COLSxROWS"},
       {{"--window", "0x7", good, out}, 2, "COLSxROWS"},
@@ -102,6 +105,13 @@ TEST(WrongInput, EndsInOneLineAndLeavesNothing) {
       {{"--co", "COMPRESS", good, out}, 2, "KEY=VALUE"},
       {{"--co", "COMPRES=LZW", good, out}, 2, "COMPRES"},
       {{"--memory", "1", "--size", "5001", folder / "cut.tif", out}, 1, "--memory"},
+      {{"--src-nodata", "", good, out}, 2, "--src-nodata: it is empty"},
+      {{"--dst-nodata", "", good, out}, 2, "--dst-nodata: it is empty"},
+      {{"--background", "", good, out}, 2, "--background: it is empty"},
+      {{"--mask", "", good, out}, 2, "--mask: it is empty"},
+      {{"--of", "", good, out}, 2, "--of: it is empty"},
+      {{"", out}, 2, "IN: it is empty"},
+      {{good, ""}, 2, "OUT: it is empty"},
       {{good}, 2, "OUT is required"},
       {{}, 2, "IN is required"},
       {{good, out, out}, 2, "not expected"},
@@ -118,6 +128,7 @@ TEST(WrongInput, EndsInOneLineAndLeavesNothing) {
   }
   ExpectOneLine(RunProgram({}), 2, "--help");
   ExpectOneLine(RunProgram({"avrage", good, out}), 2, "no command 'avrage'");
+  ExpectOneLine(RunProgram({"sample", ""}), 2, "DIR: it is empty");
   EXPECT_EQ(fs::file_size(folder / "existing.tif"), 8U);
 }
 
@@ -126,6 +137,15 @@ TEST(WrongInput, HelpAndVersionSucceed) {
   const Outcome help = RunProgram({"average", "--help"});
   EXPECT_EQ(help.status, 0);
   EXPECT_NE(help.out.find("zarn average --size 5 "), std::string::npos) << help.out;
+}
+
+TEST(WrongInput, HelpFitsATerminal) {
+  for (const Arguments& page : std::vector<Arguments>{{}, {"average"}, {"sample"}}) {
+    Arguments arguments = page;
+    arguments.emplace_back("--help");
+    std::istringstream help(RunProgram(arguments).out);
+    for (std::string line; std::getline(help, line);) EXPECT_LE(line.size(), 80U) << line;
+  }
 }
 
 TEST(FullDisk, IsReportedAndLeavesTheExistingOutput) {
