@@ -6,6 +6,7 @@
 #include <gdal_priv.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <mutex>
 #include <set>
@@ -22,6 +23,7 @@ std::mutex mutex;
 std::set<std::string> printedWarnings;
 bool warningsSilenced = false;
 std::string lastFailure;  // of any thread
+int lastSpaceError = 0;   // likewise
 std::vector<std::pair<std::string, std::string>> renamings;
 thread_local bool failureWatched = false;
 thread_local std::string firstFailure;
@@ -46,6 +48,7 @@ std::string OneLine(std::string text) {
 
 // GDAL's C code cannot be left by an exception; the only one to expect here is a lack of memory.
 void CPL_STDCALL HandleGdalMessage(CPLErr level, CPLErrorNum, const char* text) try {
+  const int cause = errno;  // as the failed write has left it
   const std::string line = OneLine(text);
   // GDAL ends the program after a fatal error and would leave files behind.
   if (level == CE_Fatal) AbandonAndExit(line.c_str());
@@ -54,6 +57,7 @@ void CPL_STDCALL HandleGdalMessage(CPLErr level, CPLErrorNum, const char* text) 
   if (failureWatched && firstFailure.empty()) firstFailure = line;
   const std::lock_guard lock(mutex);
   lastFailure = line;
+  if (IsSpaceError(cause)) lastSpaceError = cause;
 } catch (...) {
   AbandonAndExit("out of memory");
 }
@@ -102,6 +106,13 @@ std::string LastGdalMessage(const std::string& name) {
     if (!name.empty() && text.starts_with(front)) return text.substr(front.size());
   }
   return text;
+}
+
+bool IsSpaceError(int error) { return error == ENOSPC || error == EDQUOT || error == EFBIG; }
+
+int LastSpaceError() {
+  const std::lock_guard lock(mutex);
+  return lastSpaceError;
 }
 
 GdalFailureWatch::GdalFailureWatch() {

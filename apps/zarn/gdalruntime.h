@@ -32,6 +32,12 @@ void RenameInMessages(const std::string& from, const std::string& to);
 /// one line, with `name` taken off its front; empty when there was none.
 std::string LastGdalMessage(const std::string& name = {});
 
+/// Whether a value of errno says that the system refuses to store more: ENOSPC, EDQUOT or EFBIG.
+bool IsSpaceError(int error);
+/// Such a value when GDAL, on any thread, has reported a failure in its wake, otherwise 0. GDAL's
+/// own messages seldom tell.
+int LastSpaceError();
+
 /// Notes the first failure that GDAL reports on this thread while it lives: closing a dataset
 /// reports a full disk in no other way. At most one per thread at a time.
 class GdalFailureWatch {

@@ -106,15 +106,6 @@ class TargetFolder {
   std::optional<RemoveWhenInterrupted> removal_;
 };
 
-// Closes a dataset and reports what only then turns out not to have been written.
-void Close(DatasetPtr dataset, const std::string& name) {
-  const GdalFailureWatch watch;
-  CPLErrorReset();
-  dataset->FlushCache(true);
-  dataset.reset();
-  if (!watch.First().empty()) FailWriting(name, watch.First());
-}
-
 DatasetPtr Create(const char* driver, const StagingFolder& file, const Window& size, int bands,
                   GDALDataType type, const CPLStringList& options) {
   CPLErrorReset();
@@ -167,7 +158,7 @@ void WriteRaster(const StagingFolder& file, const Window& window, std::vector<T>
                                             height, kType, kBands, nullptr, kBands * kSample,
                                             kBands * kSample * width, kSample, nullptr));
   if (state != CE_None) FailWriting(name, LastGdalMessage(file.StagedFile().string()));
-  Close(std::move(dataset), name);
+  CloseChecked(std::move(dataset), name);
 }
 
 void WriteCutline(const StagingFolder& file, const std::vector<Vec>& ring) {
@@ -192,7 +183,7 @@ void WriteCutline(const StagingFolder& file, const std::vector<Vec>& ring) {
   feature.SetField("scene", "scene2");
   require(feature.SetGeometry(&polygon) == OGRERR_NONE);
   require(layer->CreateFeature(&feature) == OGRERR_NONE);
-  Close(std::move(dataset), name);
+  CloseChecked(std::move(dataset), name);
 }
 
 CPLJSONArray ToJson(const Color& color, double scale) {
@@ -245,6 +236,13 @@ void WriteParameters(const StagingFolder& file, std::uint32_t seed,
   }
 }
 
+void PublishAll(const std::vector<std::unique_ptr<StagingFolder>>& files) try {
+  for (const auto& file : files) file->Publish();
+} catch (...) {
+  for (const auto& file : files) file->Withdraw();
+  throw;
+}
+
 void WriteSample(const SampleOptions& options) {
   if (options.quiet) SilenceWarnings();
   SetGdalThreads(0);
@@ -277,7 +275,7 @@ void WriteSample(const SampleOptions& options) {
 
   {
     const HoldInterruptions untilAllAreInPlace;
-    for (const auto& file : files) file->Publish();
+    PublishAll(files);
     files.clear();
     target.Keep();
   }

@@ -3,9 +3,11 @@
 
 #include <cpl_error.h>
 
+#include <cerrno>
 #include <cstdint>
 #include <string>
 #include <system_error>
+#include <vector>
 
 #include "apps/zarn/carryover.h"
 #include "apps/zarn/errors.h"
@@ -15,16 +17,31 @@ namespace zarn::app {
 namespace fs = std::filesystem;
 namespace {
 
-const OutputOptions& RefusingInputs(const OutputOptions& options, const RasterSource& source) {
-  const CPLStringList files(source.Dataset().GetFileList());
-  for (int i = 0; i < files.size(); ++i) {
-    std::error_code error;
-    if (fs::equivalent(files[i], options.target, error)) {
-      throw UsageError("the output " + options.target + " is a file of the input " + source.Name() +
-                       "; name another output");
+// `files` are what an output at `target` is going to replace. Every raster that is open is being
+// read: the input, a mask, whatever else a command works with.
+void RefuseReplacingInputs(const fs::path& target, const std::vector<fs::path>& files) {
+  int count = 0;
+  GDALDataset* const* const inputs = GDALDataset::GetOpenDatasets(&count);
+  for (int i = 0; i < count; ++i) {
+    const CPLStringList parts(inputs[i]->GetFileList());
+    for (int k = 0; k < parts.size(); ++k) {
+      for (const fs::path& file : files) {
+        std::error_code error;
+        if (!fs::equivalent(parts[k], file, error)) continue;
+        throw UsageError("the output " + target.string() +
+                         (file == target ? " is" : " would replace " + file.string() + ",") +
+                         " a file of the input " + inputs[i]->GetDescription() +
+                         "; name another output");
+      }
     }
   }
-  return options;
+}
+
+std::string TargetBesideInputs(const std::string& target) {
+  std::vector<fs::path> files = SideFiles(target);
+  files.emplace_back(target);
+  RefuseReplacingInputs(target, files);
+  return target;
 }
 
 int CPL_STDCALL UpdateCounter(double fraction, const char*, void* counter) {
@@ -32,32 +49,52 @@ int CPL_STDCALL UpdateCounter(double fraction, const char*, void* counter) {
   return TRUE;
 }
 
-void CloseChecked(DatasetPtr dataset, const std::string& name) {
-  // Closing has no result of its own; a full disk shows only as a reported failure.
-  const GdalFailureWatch watch;
-  CPLErrorReset();
-  dataset->FlushCache(true);
-  dataset.reset();
-  if (!watch.First().empty()) FailWriting(name, watch.First());
+// `last` is the value of errno: some drivers just return after a failed write.
+int SpaceErrorAt(const std::string& name, int last) {
+  if (const int reported = LastSpaceError(); reported != 0) return reported;
+  if (IsSpaceError(last)) return last;
+  std::error_code error;
+  const fs::space_info space = fs::space(fs::absolute(name, error).parent_path(), error);
+  constexpr std::uintmax_t kNothingLeft = 1 << 16;
+  return !error && space.available < kNothingLeft ? ENOSPC : 0;
 }
 
 }  // namespace
 
 void FailWriting(const std::string& name, const std::string& reason) {
-  std::error_code error;
-  const fs::path folder = fs::absolute(name, error).parent_path();
-  const fs::space_info space = fs::space(folder, error);
-  constexpr std::uintmax_t kNothingLeft = 1 << 16;
-  const bool full = !error && space.available < kNothingLeft;
-  throw RunError("cannot write " + name + ": " +
-                 (full             ? "the disk is full; free some space or write elsewhere"
-                  : reason.empty() ? "the file system refused it"
-                                   : reason));
+  const int last = errno;
+  std::string cause = reason.empty() ? "the file system refused it" : reason;
+  switch (SpaceErrorAt(name, last)) {
+    case ENOSPC:
+      cause = "the disk is full; free some space or write elsewhere";
+      break;
+    case EDQUOT:
+      cause = "the disk quota is used up; free some space or write elsewhere";
+      break;
+    case EFBIG:
+      cause = "it would be larger than files may become here (see ulimit -f); write elsewhere";
+      break;
+    default:
+      break;
+  }
+  throw RunError("cannot write " + name + ": " + cause);
+}
+
+void CloseChecked(DatasetPtr dataset, const std::string& name) {
+  // Closing has no result of its own: a full disk shows as a reported failure, and with drivers
+  // that do not look at the last bytes only in what the system has left behind.
+  const GdalFailureWatch watch;
+  CPLErrorReset();
+  errno = 0;
+  dataset->FlushCache(true);
+  dataset.reset();
+  if (!watch.First().empty() || IsSpaceError(errno) || LastSpaceError() != 0)
+    FailWriting(name, watch.First());
 }
 
 StagedOutput::StagedOutput(const OutputOptions& options, const RasterSource& like,
                            const std::vector<double>& noData)
-    : format_(options.format, RefusingInputs(options, like).target, options.creation),
+    : format_(options.format, TargetBesideInputs(options.target), options.creation),
       staging_(options.target, options.overwrite) {
   RenameInMessages(staging_.StagedFile().string(), Name());
   RenameInMessages(staging_.Scratch().string(), Name());
@@ -76,14 +113,13 @@ void StagedOutput::Create(const RasterSource& like) {
   CPLErrorReset();
   dataset_.reset(driver.Create(file.c_str(), like.Width(), like.Height(),
                                like.Dataset().GetRasterCount(), like.Type().gdal, options.List()));
-  if (!dataset_) {
-    throw RunError("cannot write " + Name() + ": " + LastGdalMessage(Name()));
-  }
+  if (!dataset_) FailWriting(Name(), LastGdalMessage(Name()));
 }
 
 void StagedOutput::Publish(nspio::Counter& progress) {
   CloseChecked(std::move(dataset_), Name());
   if (!format_.WritesBlocks()) CopyToFormat(progress);
+  RefuseReplacingInputs(staging_.Target(), staging_.FilesToPublish());
   staging_.Publish();
   progress.Update(1);
 }
@@ -91,9 +127,10 @@ void StagedOutput::Publish(nspio::Counter& progress) {
 void StagedOutput::CopyToFormat(nspio::Counter& progress) {
   DatasetPtr scratch = OpenRaster(staging_.Scratch());
   CPLErrorReset();
+  errno = 0;
   DatasetPtr copy(format_.Driver().CreateCopy(staging_.StagedFile().c_str(), scratch.get(), FALSE,
                                               options_.List(), UpdateCounter, &progress));
-  if (!copy) FailWriting(Name(), LastGdalMessage(Name()));
+  if (!copy || IsSpaceError(errno)) FailWriting(Name(), LastGdalMessage(Name()));
   CloseChecked(std::move(copy), Name());
   scratch.reset();
   fs::remove(staging_.Scratch());

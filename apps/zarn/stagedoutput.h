@@ -25,8 +25,8 @@ struct OutputOptions {
 /// appears at its target, whole, with `Publish`; destroyed before that it leaves no trace.
 class StagedOutput {
  public:
-  /// Throws `UsageError` when the target is one of the source's own files, `RunError` when it
-  /// cannot be written.
+  /// Throws `UsageError` when the target or a file that goes with it is a file of a raster that is
+  /// open, `RunError` when it cannot be written.
   StagedOutput(const OutputOptions& options, const RasterSource& like,
                const std::vector<double>& noData);
 
@@ -51,7 +51,12 @@ class StagedOutput {
   DatasetPtr dataset_;
 };
 
-/// Throws `RunError` "cannot write ..." with GDAL's reason, or the full disk where that is why.
+/// Closes a dataset that was written; throws as `FailWriting` does when only that shows that
+/// something was not.
+void CloseChecked(DatasetPtr dataset, const std::string& name);
+
+/// Throws `RunError` "cannot write ..." with `reason`, or the full disk, the used quota or the
+/// largest size of a file where that is why.
 [[noreturn]] void FailWriting(const std::string& name, const std::string& reason);
 
 }  // namespace zarn::app

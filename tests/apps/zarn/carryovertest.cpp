@@ -152,6 +152,21 @@ TEST(CarryOver, DropsTheStaleCompanionsOfAReplacedFile) {
   ASSERT_EQ(RunProgram({"average", "--overwrite", folder / "in.tif", folder / "out.tif"}).status,
             0);
   EXPECT_EQ(folder.Names(), (std::set<std::string>{"in.tif", "out.tif"}));
+
+  // A spill file belongs to the format that has one; beside another file it is somebody else's.
+  const auto replace = [&](const std::vector<std::string>& options) {
+    std::vector<std::string> arguments{"average", "--overwrite", folder / "in.tif",
+                                       folder / "out.tif"};
+    arguments.insert(arguments.end(), options.begin(), options.end());
+    EXPECT_EQ(RunProgram(arguments).status, 0);
+  };
+  replace({"--of", "HFA", "--co", "USE_SPILL=YES"});
+  EXPECT_TRUE(folder.Names().contains("out.ige"));
+  replace({});
+  EXPECT_EQ(folder.Names(), (std::set<std::string>{"in.tif", "out.tif"}));
+  std::ofstream(folder / "out.ige") << "of another raster";
+  replace({});
+  EXPECT_TRUE(folder.Names().contains("out.ige"));
 }
 
 TEST(CarryOver, WritesTheGeoTiffThatWasAskedFor) {

@@ -48,6 +48,10 @@ void WriteInputs(const TemporaryFolder& folder) {
       << "<VRTDataset rasterXSize='4' rasterYSize='4'><VRTRasterBand dataType='Byte' band='1'/>"
          "<VRTRasterBand dataType='Int16' band='2'/></VRTDataset>";
   std::ofstream(folder / "existing.tif") << "precious";
+  // Rasters in places that belong to another output.
+  Write(NoiseImage(30, 20, 1, GDT_Byte, {}, 1), folder / "good.tif.ovr");
+  Write(NoiseImage(60, 40, 1, GDT_Byte, {}, 1), folder / "absent.tif.msk");
+  fs::create_symlink("circle.tif", folder / "circle.tif");
 }
 
 TEST(WrongInput, EndsInOneLineAndLeavesNothing) {
@@ -77,6 +81,15 @@ TEST(WrongInput, EndsInOneLineAndLeavesNothing) {
       {{good, folder / "nowhere/out.tif"}, 1, "there is no folder"},
       {{"--overwrite", good, folder / "."}, 1, "not a regular file"},
       {{"--overwrite", good, good}, 2, "name another output"},
+      {{"--overwrite", folder / "good.tif.ovr", good}, 2, "a file of the input"},
+      {{"--mask", folder / "absent.tif.msk", good, folder / "absent.tif"},
+       2,
+       "would replace " + folder / "absent.tif.msk"},
+      {{good, folder / "absent.tif"}, 1, "absent.tif.msk exists"},
+      {{good, folder / "circle.tif"}, 1, "symbolic links"},
+      {{good, "/dev/null"}, 1, "/dev/null is not a regular file"},
+      // Here an open file without a name, otherwise a pipe or a terminal.
+      {{good, "/dev/stdout"}, 1, "/dev/stdout is not a regular file"},
       {{"--mask", folder / "mask61.tif", good, out}, 1, "61 x 40"},
       {{"--mask", good, good, out}, 1, "3 bands"},
       {{"--mask", folder / "moved.tif", folder / "placed.tif", out}, 1, "elsewhere"},
@@ -156,15 +169,44 @@ TEST(FullDisk, IsReportedAndLeavesTheExistingOutput) {
 #endif
   const TemporaryFolder folder;
   Write(NoiseImage(700, 500, 1, GDT_Float32, {}, 1), folder / "in.tif");
-  for (const Arguments& format :
-       std::vector<Arguments>{{}, {"--co", "COMPRESS=NONE"}, {"--of", "COG"}, {"--of", "ENVI"}}) {
+  for (const Arguments& format : std::vector<Arguments>{{},
+                                                        {"--co", "COMPRESS=NONE"},
+                                                        {"--of", "COG"},
+                                                        {"--of", "ENVI"},
+                                                        {"--of", "HFA"},
+                                                        {"--of", "AAIGrid"}}) {
     std::ofstream(folder / "out.tif") << "precious";
     Arguments arguments{"average", "--overwrite", folder / "in.tif", folder / "out.tif"};
     arguments.insert(arguments.begin() + 1, format.begin(), format.end());
     SCOPED_TRACE(format.empty() ? "default" : format.back());
-    ExpectOneLine(RunProgram(arguments, 100000), 1, "cannot write");
+    ExpectOneLine(RunProgram(arguments, 100000), 1, "larger than files may become");
     EXPECT_EQ(folder.Names(), (std::set<std::string>{"in.tif", "out.tif"}));
     EXPECT_EQ(fs::file_size(folder / "out.tif"), 8U);
+  }
+  ExpectOneLine(RunProgram({"sample", folder / "new"}, 100000), 1, "larger than files may become");
+  EXPECT_EQ(folder.Names(), (std::set<std::string>{"in.tif", "out.tif"}));
+}
+
+TEST(FullDisk, IsNoticedDownToTheLastByte) {
+#if defined(__has_feature)
+#if __has_feature(thread_sanitizer)
+  GTEST_SKIP() << "the limit on file sizes also hits the thread sanitizer's own mappings";
+#endif
+#endif
+  const TemporaryFolder folder;
+  Write(NoiseImage(200, 150, 1, GDT_UInt16, {}, 1), folder / "in.tif");
+  // Some of these drivers do not look whether their last bytes were taken.
+  for (const std::string format :
+       {"GTiff", "COG", "PNG", "ENVI", "HFA", "PCIDSK", "AAIGrid", "XYZ"}) {
+    SCOPED_TRACE(format);
+    const Arguments arguments{"average",         "--overwrite",      "--of", format,
+                              folder / "in.tif", folder / "out.tif", "-q"};
+    ASSERT_EQ(RunProgram(arguments).status, 0);
+    const std::uint64_t size = fs::file_size(folder / "out.tif");
+    for (const std::uint64_t missing : {1U, 100U, 5000U}) {
+      ExpectOneLine(RunProgram(arguments, size - missing), 1, "larger than files may become");
+      EXPECT_EQ(fs::file_size(folder / "out.tif"), size);
+    }
   }
 }
 
