@@ -1,0 +1,274 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/estimate/fitgainoffset.h"
+
+#include <cstdio>
+#include <filesystem>
+#include <memory>
+#include <numeric>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "apps/zarn/errors.h"
+#include "apps/zarn/estimate/cellmeans.h"
+#include "apps/zarn/estimate/gainoffsetnetwork.h"
+#include "apps/zarn/estimate/ground.h"
+#include "apps/zarn/estimate/pixelscan.h"
+#include "apps/zarn/estimate/stagedjson.h"
+#include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/interruption.h"
+#include "apps/zarn/nodata.h"
+#include "apps/zarn/progress.h"
+
+namespace zarn::app {
+namespace fs = std::filesystem;
+namespace {
+
+// Fewer common cells say nothing about a gain.
+constexpr std::size_t kLeastCells = 20;
+
+struct FitGainOffsetOptions {
+  std::string reference;
+  std::vector<std::string> inputs;
+  std::string output;
+  std::string folder;
+  std::string srcNoData;
+  GainLimits limits;
+  int cell = 0;
+  bool overwrite = false;
+  bool quiet = false;
+};
+
+// The files to write, one for each input.
+std::vector<std::string> Targets(const FitGainOffsetOptions& options) {
+  if (options.output.empty() == options.folder.empty()) {
+    throw UsageError("fit-gain-offset: give either -o FILE or --out-dir DIR");
+  }
+  if (!options.output.empty() && options.inputs.size() > 1) {
+    throw UsageError("fit-gain-offset: -o is for one IN; give --out-dir DIR for " +
+                     std::to_string(options.inputs.size()));
+  }
+  if (!options.output.empty()) return {options.output};
+  std::vector<std::string> targets;
+  std::set<std::string> names;
+  for (const std::string& input : options.inputs) {
+    const std::string name = fs::path(input).stem().string() + ".gain-offset.json";
+    if (!names.insert(name).second) {
+      throw UsageError("fit-gain-offset: two of IN would write " + name +
+                       "; give them names of their own");
+    }
+    targets.push_back((fs::path(options.folder) / name).string());
+  }
+  return targets;
+}
+
+// The scenes, the reference first, and what was measured on them.
+class SceneSet {
+ public:
+  explicit SceneSet(const FitGainOffsetOptions& options) {
+    sources_.emplace_back(options.reference);
+    for (const std::string& input : options.inputs) sources_.emplace_back(input);
+    for (const RasterSource& source : sources_) {
+      source.RefusePalette();
+      noData_.push_back(ResolveNoData(source, options.srcNoData, ""));
+    }
+    grounds_ = ComparableGrounds(sources_);
+  }
+
+  const std::vector<RasterSource>& Sources() const { return sources_; }
+  std::size_t Channels() const { return sources_.front().Channels().size(); }
+  std::size_t Size() const { return sources_.size(); }
+  double CellSide() const { return side_; }
+
+  void Measure(int side, nspio::Counter& progress) {
+    const OverlapLattice chosen = ChooseLattice(grounds_, Channels(), side);
+    side_ = chosen.side;
+    for (std::size_t i = 0; i < Size(); ++i) {
+      cells_.emplace_back(chosen.lattice, grounds_[i], chosen.parts[i], Channels());
+      if (chosen.parts[i].Empty()) continue;
+      const auto share = [&](std::size_t done) {
+        return static_cast<double>(done) / static_cast<double>(Size());
+      };
+      ProgressSpan span(progress, share(i), share(i + 1));
+      ScanPixels(sources_[i], noData_[i], grounds_[i].PixelsIn(chosen.parts[i]), span,
+                 [&](const PixelRun& run) { cells_[i].Add(run); });
+      cells_[i].Finish();
+    }
+  }
+
+  std::vector<CellPair> Common(std::size_t first, std::size_t second) const {
+    return CommonCells(cells_[first], cells_[second]);
+  }
+
+  std::vector<SceneOverlap> Overlaps() const {
+    std::vector<SceneOverlap> overlaps;
+    for (std::size_t first = 0; first < Size(); ++first) {
+      for (std::size_t second = first + 1; second < Size(); ++second) {
+        const std::vector<CellPair> cells = Common(first, second);
+        if (cells.size() < kLeastCells) continue;
+        overlaps.push_back({first, second, RobustMoments(cells, Channels())});
+      }
+    }
+    return overlaps;
+  }
+
+ private:
+  std::vector<RasterSource> sources_;
+  std::vector<NoDataValues> noData_;
+  std::vector<Ground> grounds_;
+  std::vector<CellMeans> cells_;
+  double side_ = 0;
+};
+
+void RequireTied(const SceneSet& scenes, const std::vector<SceneOverlap>& overlaps) {
+  const std::vector<bool> tied = TiedScenes(scenes.Size(), overlaps);
+  std::string loose;
+  for (std::size_t i = 0; i < tied.size(); ++i) {
+    if (!tied[i]) loose += (loose.empty() ? "" : ", ") + scenes.Sources()[i].Name();
+  }
+  if (loose.empty()) return;
+  throw RunError("no valid overlap ties these to " + scenes.Sources().front().Name() +
+                 ", neither directly nor through the others: " + loose);
+}
+
+using Corrections = std::vector<std::vector<GainOffset>>;
+
+// Differences between the other scenes and one of them, over all that it has in common with them.
+struct Differences {
+  std::vector<double> before;
+  std::vector<double> after;
+};
+
+Differences DifferencesTo(std::size_t scene, std::size_t channel, const SceneSet& scenes,
+                          const std::vector<SceneOverlap>& overlaps,
+                          const Corrections& corrections) {
+  Differences result;
+  for (const SceneOverlap& overlap : overlaps) {
+    if (overlap.first != scene && overlap.second != scene) continue;
+    const GainOffset& first = corrections[overlap.first][channel];
+    const GainOffset& second = corrections[overlap.second][channel];
+    const double sign = overlap.second == scene ? 1 : -1;
+    for (const CellPair& cell : scenes.Common(overlap.first, overlap.second)) {
+      const double a = cell.first[channel];
+      const double b = cell.second[channel];
+      result.before.push_back(sign * (a - b));
+      result.after.push_back(sign * (first(a) - second(b)));
+    }
+  }
+  return result;
+}
+
+double Mean(const std::vector<double>& values) {
+  return std::accumulate(values.begin(), values.end(), 0.0) / static_cast<double>(values.size());
+}
+
+void PrintTable(const SceneSet& scenes, const std::vector<SceneOverlap>& overlaps,
+                const Corrections& corrections) {
+  for (std::size_t scene = 1; scene < scenes.Size(); ++scene) {
+    for (std::size_t c = 0; c < scenes.Channels(); ++c) {
+      const Differences differences = DifferencesTo(scene, c, scenes, overlaps, corrections);
+      if (c == 0) {
+        std::printf("%s: %zu common cells of %.0f x %.0f pixels\n",
+                    scenes.Sources()[scene].Name().c_str(), differences.before.size(),
+                    scenes.CellSide(), scenes.CellSide());
+        std::printf("  band      gain     offset   mean difference     ->      spread     ->\n");
+      }
+      const GainOffset& correction = corrections[scene][c];
+      std::printf("  %4zu  %8.4f  %9.3f   %15.3f %9.3f  %9.3f %9.3f\n", c + 1, correction.gain,
+                  correction.offset, Mean(differences.before), Mean(differences.after),
+                  RobustDeviation(differences.before), RobustDeviation(differences.after));
+    }
+  }
+}
+
+nlohmann::ordered_json ToJson(const std::vector<GainOffset>& corrections) {
+  nlohmann::ordered_json channels = nlohmann::ordered_json::array();
+  for (const GainOffset& c : corrections) {
+    channels.push_back({{"gain", c.gain}, {"offset", c.offset}});
+  }
+  return {{"channels", channels}};
+}
+
+void FitGainOffset(const FitGainOffsetOptions& options) {
+  if (options.quiet) SilenceWarnings();
+  SetGdalThreads(0);
+  const std::vector<std::string> targets = Targets(options);
+  SceneSet scenes(options);
+  std::vector<std::unique_ptr<StagedJson>> files;
+  for (const std::string& target : targets) {
+    RefuseAsOutput(target, scenes.Sources());
+    files.push_back(std::make_unique<StagedJson>(target, options.overwrite));
+  }
+
+  {
+    TerminalProgress progress(options.quiet);
+    scenes.Measure(options.cell, progress);
+  }
+  const std::vector<SceneOverlap> overlaps = scenes.Overlaps();
+  RequireTied(scenes, overlaps);
+  const Corrections corrections =
+      SolveGainOffsets(scenes.Size(), overlaps, scenes.Channels(), options.limits);
+
+  for (std::size_t i = 0; i < files.size(); ++i) files[i]->Write(ToJson(corrections[i + 1]));
+  {
+    const HoldInterruptions untilAllAreInPlace;
+    for (const auto& file : files) file->Publish();
+    files.clear();
+  }
+  if (!options.quiet) PrintTable(scenes, overlaps, corrections);
+}
+
+}  // namespace
+
+void AddFitGainOffsetCommand(CLI::App& app) {
+  CLI::App& command = *app.add_subcommand(
+      "fit-gain-offset",
+      "Estimates the gains and offsets that bring overlapping rasters onto a reference");
+  const auto options = std::make_shared<FitGainOffsetOptions>();
+  command.add_option("REF", options->reference, "Raster that stays as it is")->required();
+  command.add_option("IN", options->inputs, "Rasters to bring onto it, directly or step by step")
+      ->required();
+  command.add_option("-o", options->output, "File to write for a single IN")->type_name("FILE");
+  command
+      .add_option("--out-dir", options->folder,
+                  "Existing folder to write <name of IN>.gain-offset.json to")
+      ->type_name("DIR");
+  command
+      .add_option("--damping", options->limits.damping,
+                  "How strongly gains are held at 1, against the ratio of signal to noise "
+                  "r^2 / (1 - r^2) of an overlap whose correlation is r; 0 to leave them free")
+      ->check(CLI::NonNegativeNumber)
+      ->type_name("D")
+      ->capture_default_str();
+  command
+      .add_option("--contrast", options->limits.contrast,
+                  "0 for gains of least squares, whose differences from REF are smallest; 1 for "
+                  "gains that give IN all the contrast of REF, also where the two differ")
+      ->check(CLI::Range(0.0, 1.0).description(""))
+      ->type_name("SHARE")
+      ->capture_default_str();
+  command
+      .add_option("--cell", options->cell,
+                  "Side in pixels of the cells whose means are compared; by default 8, or fewer "
+                  "where the overlap is small")
+      ->check(CLI::Range(1, 100000).description(""))
+      ->type_name("N");
+  command
+      .add_option("--src-nodata", options->srcNoData,
+                  "No-data value of all rasters, one for all bands or one for each, or 'none'; by "
+                  "default each file's own")
+      ->type_name("V[,V...]");
+  command.add_flag("--overwrite", options->overwrite, "Replace files that exist");
+  command.add_flag("-q,--quiet", options->quiet, "No table, no progress and no warnings");
+  command.callback([options] { FitGainOffset(*options); });
+  command.footer(
+      "Means and contrasts of the cells that two rasters have in common are made to agree, by "
+      "robust statistics:\ncells that fit the others badly (clouds, changes) lose their influence "
+      "(Tukey's biweight, scaled by the\nmedian absolute deviation). Several IN are solved in one "
+      "system, so that they also agree with each other.\nWhere two rasters are hardly correlated "
+      "their contrasts say little, and the damping holds the gain near 1.\n\n"
+      "Example:\n  zarn fit-gain-offset reference.tif scene.tif -o scene.json\n"
+      "  zarn gain-offset --params scene.json scene.tif balanced.tif");
+}
+
+}  // namespace zarn::app
