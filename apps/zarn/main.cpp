@@ -12,6 +12,7 @@
 #include "apps/zarn/average.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/estimate/fitgainoffset.h"
+#include "apps/zarn/estimate/fithotspot.h"
 #include "apps/zarn/gainoffset.h"
 #include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/helpformatter.h"
@@ -46,6 +47,7 @@ void AddCommands(CLI::App& app) {
       "Example:\n  zarn average --size 5 scene.tif smooth.tif");
   zarn::app::AddAverageCommand(app);
   zarn::app::AddFitGainOffsetCommand(app);
+  zarn::app::AddFitHotSpotCommand(app);
   zarn::app::AddGainOffsetCommand(app);
   zarn::app::AddLutCommand(app);
   zarn::app::AddMinMaxLutCommand(app);

@@ -92,18 +92,12 @@ double Ground::PixelArea() const {
 
 Window Ground::PixelsIn(const Extent& extent) const {
   if (extent.Empty()) return {};
-  const auto column = [&](double x, double y) {
-    return inverse_[0] + x * inverse_[1] + y * inverse_[2];
-  };
-  const auto row = [&](double x, double y) {
-    return inverse_[3] + x * inverse_[4] + y * inverse_[5];
-  };
   const auto [left, right] =
-      std::minmax({column(extent.left, extent.top), column(extent.right, extent.top),
-                   column(extent.left, extent.bottom), column(extent.right, extent.bottom)});
+      std::minmax({Column(extent.left, extent.top), Column(extent.right, extent.top),
+                   Column(extent.left, extent.bottom), Column(extent.right, extent.bottom)});
   const auto [top, bottom] =
-      std::minmax({row(extent.left, extent.top), row(extent.right, extent.top),
-                   row(extent.left, extent.bottom), row(extent.right, extent.bottom)});
+      std::minmax({Row(extent.left, extent.top), Row(extent.right, extent.top),
+                   Row(extent.left, extent.bottom), Row(extent.right, extent.bottom)});
   const auto inside = [](double value, std::int64_t limit) {
     return static_cast<std::int64_t>(std::clamp(value, 0.0, static_cast<double>(limit)));
   };

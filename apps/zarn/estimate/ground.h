@@ -39,6 +39,11 @@ class Ground {
   double Y(double column, double row) const {
     return transform_[3] + column * transform_[4] + row * transform_[5];
   }
+  /// The column and row of a point of the map.
+  double Column(double x, double y) const {
+    return inverse_[0] + x * inverse_[1] + y * inverse_[2];
+  }
+  double Row(double x, double y) const { return inverse_[3] + x * inverse_[4] + y * inverse_[5]; }
   const Extent& Bounds() const { return bounds_; }
   /// Width and height that a pixel takes along the axes of the map.
   double PixelWidth() const;

@@ -1,0 +1,172 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/estimate/fithotspot.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <memory>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "apps/zarn/errors.h"
+#include "apps/zarn/estimate/cellsamples.h"
+#include "apps/zarn/estimate/ground.h"
+#include "apps/zarn/estimate/hotspotfit.h"
+#include "apps/zarn/estimate/pixelscan.h"
+#include "apps/zarn/estimate/stagedjson.h"
+#include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/nodata.h"
+#include "apps/zarn/progress.h"
+
+namespace zarn::app {
+namespace {
+
+// Below this the terms of the fit could be bent to any image.
+constexpr std::size_t kLeastCells = 30;
+
+struct FitHotSpotOptions {
+  std::string input;
+  std::string reference;
+  std::string output;
+  std::string srcNoData;
+  std::size_t classes = 20;
+  bool overwrite = false;
+  bool quiet = false;
+};
+
+// Keeps the cells that both have, and the reference's medians in them.
+LandModel MatchReference(const std::vector<CellSummary>& reference,
+                         std::vector<CellSummary>& cells) {
+  std::vector<std::vector<double>> medians(cells.empty() ? 0 : cells.front().medians.size());
+  std::vector<CellSummary> common;
+  auto other = reference.begin();
+  for (CellSummary& cell : cells) {
+    while (other != reference.end() && other->cell < cell.cell) ++other;
+    if (other == reference.end()) break;
+    if (other->cell != cell.cell) continue;
+    for (std::size_t c = 0; c < medians.size(); ++c) medians[c].push_back(other->medians[c]);
+    common.push_back(std::move(cell));
+  }
+  cells = std::move(common);
+  return LandModel::FromReference(std::move(medians));
+}
+
+void RequireEnough(const std::vector<CellSummary>& cells, const RasterSource& source) {
+  if (cells.size() >= kLeastCells) return;
+  throw RunError(source.Name() + " has only " + std::to_string(cells.size()) +
+                 " cells with enough valid pixels; a fit needs " + std::to_string(kLeastCells));
+}
+
+void PrintTable(const RasterSource& source, std::size_t cells,
+                const std::vector<QuadraticFit>& fits) {
+  std::printf("%s: %zu cells\n  band     spread         ->   p0 .. p5\n", source.Name().c_str(),
+              cells);
+  for (std::size_t c = 0; c < fits.size(); ++c) {
+    std::printf("  %4zu  %9.3f  %9.3f  ", c + 1, fits[c].before, fits[c].after);
+    for (const double p : fits[c].coefficients) std::printf(" %.4g", p);
+    std::printf("\n");
+  }
+}
+
+nlohmann::ordered_json ToJson(const RasterSource& source, const std::vector<QuadraticFit>& fits) {
+  nlohmann::ordered_json channels = nlohmann::ordered_json::array();
+  for (const QuadraticFit& fit : fits) channels.push_back({{"coefficients", fit.coefficients}});
+  return {
+      {"columnDivisor", source.Width()}, {"rowDivisor", source.Height()}, {"channels", channels}};
+}
+
+void FitHotSpot(const FitHotSpotOptions& options) {
+  if (options.quiet) SilenceWarnings();
+  SetGdalThreads(0);
+  std::vector<RasterSource> sources;
+  sources.emplace_back(options.input);
+  if (!options.reference.empty()) sources.emplace_back(options.reference);
+  for (const RasterSource& each : sources) each.RefusePalette();
+  RefuseAsOutput(options.output, sources);
+  const std::vector<Ground> grounds = ComparableGrounds(sources);
+  StagedJson file(options.output, options.overwrite);
+
+  const RasterSource& source = sources.front();
+  const std::size_t channels = source.Channels().size();
+  const WindowSize size{source.Width(), source.Height()};
+  PositionMoments positions(source.Width(), source.Height());
+  std::vector<std::vector<CellSummary>> summaries;
+  {
+    TerminalProgress progress(options.quiet);
+    for (std::size_t i = 0; i < sources.size(); ++i) {
+      const auto share = [&](std::size_t done) {
+        return static_cast<double>(done) / static_cast<double>(sources.size());
+      };
+      ProgressSpan span(progress, share(i), share(i + 1));
+      CellSamples samples(grounds.front(), size, grounds[i], channels);
+      const Window area =
+          grounds[i].PixelsIn(Intersection(grounds.front().Bounds(), grounds[i].Bounds()));
+      if (area.width <= 0 || area.height <= 0) {
+        throw RunError(sources[i].Name() + " does not overlap " + source.Name());
+      }
+      ScanPixels(sources[i], ResolveNoData(sources[i], options.srcNoData, ""), area, span,
+                 [&](const PixelRun& run) {
+                   samples.Add(run);
+                   if (i == 0) positions.Add(run);
+                 });
+      summaries.push_back(samples.Summaries());
+    }
+  }
+
+  std::vector<CellSummary>& cells = summaries.front();
+  RequireEnough(cells, source);
+  const std::size_t classes = std::clamp<std::size_t>(cells.size() / 30, 1, options.classes);
+  const LandModel land = sources.size() > 1 ? MatchReference(summaries.back(), cells)
+                                            : LandModel::FromClasses(cells, classes);
+  RequireEnough(cells, sources.back());
+  std::vector<QuadraticFit> fits;
+  for (std::size_t c = 0; c < channels; ++c) {
+    fits.push_back(FitQuadratic(cells, land, c, source.Width(), source.Height()));
+    positions.CentreOn(fits.back().coefficients);
+  }
+  file.Write(ToJson(source, fits));
+  file.Publish();
+  if (!options.quiet) PrintTable(source, cells.size(), fits);
+}
+
+}  // namespace
+
+void AddFitHotSpotCommand(CLI::App& app) {
+  CLI::App& command = *app.add_subcommand(
+      "fit-hotspot", "Estimates the quadratic brightness bulge that zarn hotspot subtracts");
+  const auto options = std::make_shared<FitHotSpotOptions>();
+  command.add_option("IN", options->input, "Raster with the bulge")->required();
+  command.add_option("-o", options->output, "File to write")->type_name("FILE")->required();
+  command
+      .add_option("--reference", options->reference,
+                  "Raster of the same ground without the bulge; its colours may differ by a gain "
+                  "and an offset")
+      ->type_name("FILE");
+  command
+      .add_option("--classes", options->classes,
+                  "Without a reference, kinds of land cover to tell apart; 1 takes all land for "
+                  "one")
+      ->check(CLI::Range(1, 200).description(""))
+      ->type_name("N")
+      ->capture_default_str();
+  command
+      .add_option("--src-nodata", options->srcNoData,
+                  "No-data value, one for all bands or one for each, or 'none'; by default the "
+                  "file's own")
+      ->type_name("V[,V...]");
+  command.add_flag("--overwrite", options->overwrite, "Replace the file if it exists");
+  command.add_flag("-q,--quiet", options->quiet, "No table, no progress and no warnings");
+  command.callback([options] { FitHotSpot(*options); });
+  command.footer(
+      "A quadratic h(x, y) = p0 x^2 + p1 x y + p2 y^2 + p3 x + p4 y + p5 with x = column / width "
+      "and y = row / height\nis fitted per band to the medians of cells, by least squares with "
+      "Huber's weights. The image keeps its brightness:\np5 makes the mean of h over the valid "
+      "pixels 0.\n\nA single image cannot tell a bulge from land that is brighter on one side. "
+      "Cells are therefore compared within\nclasses of the same colour and roughness, which works "
+      "as far as the bulge is alike in all bands; a reference\nsettles it. A bulge that is no "
+      "quadratic is removed as far as one reaches.\n\n"
+      "Example:\n  zarn fit-hotspot scene.tif -o hotspot.json\n"
+      "  zarn hotspot --params hotspot.json scene.tif even.tif");
+}
+
+}  // namespace zarn::app

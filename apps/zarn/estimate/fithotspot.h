@@ -1,0 +1,11 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace zarn::app {
+
+/// Adds the command `fit-hotspot` to the program.
+void AddFitHotSpotCommand(CLI::App& app);
+
+}  // namespace zarn::app
