@@ -101,7 +101,8 @@ std::vector<CellPair> CommonCells(const CellMeans& a, const CellMeans& b) {
   for (std::int64_t row = std::max(a.FirstRow(), b.FirstRow()); row < bottom; ++row) {
     for (std::int64_t column = std::max(a.FirstColumn(), b.FirstColumn()); column < right;
          ++column) {
-      const CellPair pair{a.At(column, row), b.At(column, row)};
+      const CellPair pair{a.Lattice().CentreX(column), a.Lattice().CentreY(row), a.At(column, row),
+                          b.At(column, row)};
       if (pair.first != nullptr && pair.second != nullptr) pairs.push_back(pair);
     }
   }

@@ -22,6 +22,12 @@ struct CellLattice {
 
   std::int64_t Column(double x) const;
   std::int64_t Row(double y) const;
+  double CentreX(std::int64_t column) const {
+    return left + (static_cast<double>(column) + 0.5) * cellWidth;
+  }
+  double CentreY(std::int64_t row) const {
+    return top - (static_cast<double>(row) + 0.5) * cellHeight;
+  }
 };
 
 /// The means of one image in the cells of a part of a lattice.
@@ -35,7 +41,7 @@ class CellMeans {
   /// To be called after the last `Add`: gives up cells of which less than half was valid.
   void Finish();
 
-  std::size_t Channels() const { return channels_; }
+  const CellLattice& Lattice() const { return lattice_; }
   std::int64_t FirstColumn() const { return firstColumn_; }
   std::int64_t FirstRow() const { return firstRow_; }
   std::int64_t Columns() const { return columns_; }
@@ -76,6 +82,8 @@ OverlapLattice ChooseLattice(const std::vector<Ground>& grounds, std::size_t cha
 
 /// The means of two images in a cell that both have: channel by channel.
 struct CellPair {
+  double x;  ///< centre, map coordinates
+  double y;
   const double* first;
   const double* second;
 };

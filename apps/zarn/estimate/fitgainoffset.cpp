@@ -4,28 +4,23 @@
 #include <cstdio>
 #include <filesystem>
 #include <memory>
-#include <numeric>
 #include <set>
 #include <string>
 #include <vector>
 
 #include "apps/zarn/errors.h"
 #include "apps/zarn/estimate/cellmeans.h"
+#include "apps/zarn/estimate/comparisonoptions.h"
 #include "apps/zarn/estimate/gainoffsetnetwork.h"
-#include "apps/zarn/estimate/ground.h"
-#include "apps/zarn/estimate/pixelscan.h"
+#include "apps/zarn/estimate/sceneset.h"
 #include "apps/zarn/estimate/stagedjson.h"
 #include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/interruption.h"
-#include "apps/zarn/nodata.h"
 #include "apps/zarn/progress.h"
 
 namespace zarn::app {
 namespace fs = std::filesystem;
 namespace {
-
-// Fewer common cells say nothing about a gain.
-constexpr std::size_t kLeastCells = 20;
 
 struct FitGainOffsetOptions {
   std::string reference;
@@ -62,63 +57,17 @@ std::vector<std::string> Targets(const FitGainOffsetOptions& options) {
   return targets;
 }
 
-// The scenes, the reference first, and what was measured on them.
-class SceneSet {
- public:
-  explicit SceneSet(const FitGainOffsetOptions& options) {
-    sources_.emplace_back(options.reference);
-    for (const std::string& input : options.inputs) sources_.emplace_back(input);
-    for (const RasterSource& source : sources_) {
-      source.RefusePalette();
-      noData_.push_back(ResolveNoData(source, options.srcNoData, ""));
-    }
-    grounds_ = ComparableGrounds(sources_);
-  }
-
-  const std::vector<RasterSource>& Sources() const { return sources_; }
-  std::size_t Channels() const { return sources_.front().Channels().size(); }
-  std::size_t Size() const { return sources_.size(); }
-  double CellSide() const { return side_; }
-
-  void Measure(int side, nspio::Counter& progress) {
-    const OverlapLattice chosen = ChooseLattice(grounds_, Channels(), side);
-    side_ = chosen.side;
-    for (std::size_t i = 0; i < Size(); ++i) {
-      cells_.emplace_back(chosen.lattice, grounds_[i], chosen.parts[i], Channels());
-      if (chosen.parts[i].Empty()) continue;
-      const auto share = [&](std::size_t done) {
-        return static_cast<double>(done) / static_cast<double>(Size());
-      };
-      ProgressSpan span(progress, share(i), share(i + 1));
-      ScanPixels(sources_[i], noData_[i], grounds_[i].PixelsIn(chosen.parts[i]), span,
-                 [&](const PixelRun& run) { cells_[i].Add(run); });
-      cells_[i].Finish();
+std::vector<SceneOverlap> FindOverlaps(const SceneSet& scenes) {
+  std::vector<SceneOverlap> overlaps;
+  for (std::size_t first = 0; first < scenes.Size(); ++first) {
+    for (std::size_t second = first + 1; second < scenes.Size(); ++second) {
+      const std::vector<CellPair> cells = scenes.Common(first, second);
+      if (cells.size() < kLeastCommonCells) continue;
+      overlaps.push_back({first, second, RobustMoments(cells, scenes.Channels())});
     }
   }
-
-  std::vector<CellPair> Common(std::size_t first, std::size_t second) const {
-    return CommonCells(cells_[first], cells_[second]);
-  }
-
-  std::vector<SceneOverlap> Overlaps() const {
-    std::vector<SceneOverlap> overlaps;
-    for (std::size_t first = 0; first < Size(); ++first) {
-      for (std::size_t second = first + 1; second < Size(); ++second) {
-        const std::vector<CellPair> cells = Common(first, second);
-        if (cells.size() < kLeastCells) continue;
-        overlaps.push_back({first, second, RobustMoments(cells, Channels())});
-      }
-    }
-    return overlaps;
-  }
-
- private:
-  std::vector<RasterSource> sources_;
-  std::vector<NoDataValues> noData_;
-  std::vector<Ground> grounds_;
-  std::vector<CellMeans> cells_;
-  double side_ = 0;
-};
+  return overlaps;
+}
 
 void RequireTied(const SceneSet& scenes, const std::vector<SceneOverlap>& overlaps) {
   const std::vector<bool> tied = TiedScenes(scenes.Size(), overlaps);
@@ -158,10 +107,6 @@ Differences DifferencesTo(std::size_t scene, std::size_t channel, const SceneSet
   return result;
 }
 
-double Mean(const std::vector<double>& values) {
-  return std::accumulate(values.begin(), values.end(), 0.0) / static_cast<double>(values.size());
-}
-
 void PrintTable(const SceneSet& scenes, const std::vector<SceneOverlap>& overlaps,
                 const Corrections& corrections) {
   for (std::size_t scene = 1; scene < scenes.Size(); ++scene) {
@@ -193,7 +138,7 @@ void FitGainOffset(const FitGainOffsetOptions& options) {
   if (options.quiet) SilenceWarnings();
   SetGdalThreads(0);
   const std::vector<std::string> targets = Targets(options);
-  SceneSet scenes(options);
+  SceneSet scenes(options.reference, options.inputs, options.srcNoData);
   std::vector<std::unique_ptr<StagedJson>> files;
   for (const std::string& target : targets) {
     RefuseAsOutput(target, scenes.Sources());
@@ -204,7 +149,7 @@ void FitGainOffset(const FitGainOffsetOptions& options) {
     TerminalProgress progress(options.quiet);
     scenes.Measure(options.cell, progress);
   }
-  const std::vector<SceneOverlap> overlaps = scenes.Overlaps();
+  const std::vector<SceneOverlap> overlaps = FindOverlaps(scenes);
   RequireTied(scenes, overlaps);
   const Corrections corrections =
       SolveGainOffsets(scenes.Size(), overlaps, scenes.Channels(), options.limits);
@@ -233,31 +178,8 @@ void AddFitGainOffsetCommand(CLI::App& app) {
       .add_option("--out-dir", options->folder,
                   "Existing folder to write <name of IN>.gain-offset.json to")
       ->type_name("DIR");
-  command
-      .add_option("--damping", options->limits.damping,
-                  "How strongly gains are held at 1, against the ratio of signal to noise "
-                  "r^2 / (1 - r^2) of an overlap whose correlation is r; 0 to leave them free")
-      ->check(CLI::NonNegativeNumber)
-      ->type_name("D")
-      ->capture_default_str();
-  command
-      .add_option("--contrast", options->limits.contrast,
-                  "0 for gains of least squares, whose differences from REF are smallest; 1 for "
-                  "gains that give IN all the contrast of REF, also where the two differ")
-      ->check(CLI::Range(0.0, 1.0).description(""))
-      ->type_name("SHARE")
-      ->capture_default_str();
-  command
-      .add_option("--cell", options->cell,
-                  "Side in pixels of the cells whose means are compared; by default 8, or fewer "
-                  "where the overlap is small")
-      ->check(CLI::Range(1, 100000).description(""))
-      ->type_name("N");
-  command
-      .add_option("--src-nodata", options->srcNoData,
-                  "No-data value of all rasters, one for all bands or one for each, or 'none'; by "
-                  "default each file's own")
-      ->type_name("V[,V...]");
+  AddGainLimitOptions(command, options->limits);
+  AddComparisonOptions(command, options->cell, options->srcNoData);
   command.add_flag("--overwrite", options->overwrite, "Replace files that exist");
   command.add_flag("-q,--quiet", options->quiet, "No table, no progress and no warnings");
   command.callback([options] { FitGainOffset(*options); });

@@ -59,7 +59,7 @@ void RequireEnough(const std::vector<CellSummary>& cells, const RasterSource& so
 
 void PrintTable(const RasterSource& source, std::size_t cells,
                 const std::vector<QuadraticFit>& fits) {
-  std::printf("%s: %zu cells\n  band     spread         ->   p0 .. p5\n", source.Name().c_str(),
+  std::printf("%s: %zu cells\n  band  residuals         ->   p0 .. p5\n", source.Name().c_str(),
               cells);
   for (std::size_t c = 0; c < fits.size(); ++c) {
     std::printf("  %4zu  %9.3f  %9.3f  ", c + 1, fits[c].before, fits[c].after);

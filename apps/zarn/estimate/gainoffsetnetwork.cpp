@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/estimate/gainoffsetnetwork.h"
 
-#include <Eigen/Dense>
 #include <algorithm>
 #include <cmath>
-#include <limits>
+
+#include "apps/zarn/estimate/differencesystem.h"
 
 namespace zarn::app {
 namespace {
@@ -60,53 +60,6 @@ bool Settled(const Moments& before, const Moments& after) {
          close(before.deviationY, after.deviationY, after.deviationY);
 }
 
-// Least squares of differences between scenes: minimises the sum of
-// weight * (value[first] - value[second] - target)^2 and of damping * value^2, value[0] being 0.
-class DifferenceSystem {
- public:
-  DifferenceSystem(std::size_t scenes, double damping)
-      : matrix_(Eigen::MatrixXd::Identity(Unknowns(scenes), Unknowns(scenes)) * damping),
-        right_(Eigen::VectorXd::Zero(Unknowns(scenes))) {}
-
-  void Add(std::size_t first, std::size_t second, double target, double weight) {
-    const Eigen::Index i = Unknowns(first);
-    const Eigen::Index j = Unknowns(second);
-    if (i >= 0) {
-      matrix_(i, i) += weight;
-      right_(i) += weight * target;
-    }
-    if (j >= 0) {
-      matrix_(j, j) += weight;
-      right_(j) -= weight * target;
-    }
-    if (i >= 0 && j >= 0) {
-      matrix_(i, j) -= weight;
-      matrix_(j, i) -= weight;
-    }
-  }
-
-  // Entry 0 is scene 0.
-  std::vector<double> Solve() const {
-    const Eigen::VectorXd solution = matrix_.ldlt().solve(right_);
-    std::vector<double> values{0};
-    values.insert(values.end(), solution.begin(), solution.end());
-    return values;
-  }
-
- private:
-  static Eigen::Index Unknowns(std::size_t scenes) { return static_cast<Eigen::Index>(scenes) - 1; }
-
-  Eigen::MatrixXd matrix_;
-  Eigen::VectorXd right_;
-};
-
-double SignalToNoise(const Moments& m) {
-  constexpr double kMost = 1e4;
-  if (!(m.correlation > 0) || m.deviationX <= 0 || m.deviationY <= 0) return 0;
-  const double explained = m.correlation * m.correlation;
-  return explained < 1 ? std::min(explained / (1 - explained), kMost) : kMost;
-}
-
 }  // namespace
 
 std::vector<Moments> RobustMoments(const std::vector<CellPair>& cells, std::size_t channels) {
@@ -137,9 +90,14 @@ std::vector<Moments> RobustMoments(const std::vector<CellPair>& cells, std::size
   return moments;
 }
 
+double LogGainOntoFirst(const Moments& m, const GainLimits& limits) {
+  return std::log(m.deviationX / m.deviationY) + (1 - limits.contrast) * std::log(m.correlation);
+}
+
 std::vector<std::vector<GainOffset>> SolveGainOffsets(std::size_t scenes,
                                                       const std::vector<SceneOverlap>& overlaps,
-                                                      std::size_t channels, GainLimits limits) {
+                                                      std::size_t channels,
+                                                      const GainLimits& limits) {
   std::vector<std::vector<GainOffset>> result(scenes, std::vector<GainOffset>(channels));
   // Where nothing at all is known of a gain, it is 1 even without damping.
   const double held = std::max(limits.damping, 1e-9);
@@ -154,9 +112,9 @@ std::vector<std::vector<GainOffset>> SolveGainOffsets(std::size_t scenes,
       const double weight = m.weight / meanCells * SignalToNoise(m);
       if (weight <= 0) continue;
       // Of two scenes to be corrected neither is the truth; the reference is.
-      const double lost = overlap.first == 0 ? (1 - limits.contrast) * std::log(m.correlation) : 0;
-      logGains.Add(overlap.first, overlap.second, std::log(m.deviationY / m.deviationX) - lost,
-                   weight);
+      const double target =
+          overlap.first == 0 ? -LogGainOntoFirst(m, limits) : std::log(m.deviationY / m.deviationX);
+      logGains.Add(overlap.first, overlap.second, target, weight);
     }
     const std::vector<double> logs = logGains.Solve();
     for (std::size_t scene = 0; scene < scenes; ++scene) {

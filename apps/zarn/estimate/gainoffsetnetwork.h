@@ -34,6 +34,10 @@ struct GainLimits {
   double contrast = 0;   ///< 0 .. 1: how much of the contrast that regression loses is given back
 };
 
+/// Logarithm of the gain, not yet damped, of the second scene onto the first; the two must be
+/// positively correlated.
+double LogGainOntoFirst(const Moments& m, const GainLimits& limits);
+
 /// Gains and offsets, [scene][channel], that bring all scenes onto scene 0, which stays as it is.
 ///
 /// An overlap of two scenes that are both to be corrected asks for equal means and equal
@@ -46,7 +50,8 @@ struct GainLimits {
 /// where the scenes are not correlated. The offsets then follow from the means.
 std::vector<std::vector<GainOffset>> SolveGainOffsets(std::size_t scenes,
                                                       const std::vector<SceneOverlap>& overlaps,
-                                                      std::size_t channels, GainLimits limits);
+                                                      std::size_t channels,
+                                                      const GainLimits& limits);
 
 /// Which scenes are tied to scene 0 through overlaps.
 std::vector<bool> TiedScenes(std::size_t scenes, const std::vector<SceneOverlap>& overlaps);

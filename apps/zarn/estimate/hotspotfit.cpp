@@ -79,7 +79,7 @@ std::vector<std::size_t> Cluster(const Eigen::MatrixXd& features, std::size_t cl
 
 struct LeastSquares {
   Eigen::VectorXd solution;
-  double spread = 0;
+  double rootMeanSquare = 0;  // of the residuals, outliers included
 };
 
 LeastSquares SolveRobustly(const Eigen::MatrixXd& terms, const Eigen::VectorXd& values) {
@@ -91,10 +91,12 @@ LeastSquares SolveRobustly(const Eigen::MatrixXd& terms, const Eigen::VectorXd& 
     result.solution =
         (roots.asDiagonal() * terms).colPivHouseholderQr().solve(roots.cwiseProduct(values));
     const Eigen::VectorXd residuals = values - terms * result.solution;
-    result.spread = RobustDeviation({residuals.begin(), residuals.end()});
-    if (result.spread <= 0) break;
+    const std::vector<double> list(residuals.begin(), residuals.end());
+    result.rootMeanSquare = RootMeanSquare(list);
+    const double deviation = RobustDeviation(list);
+    if (deviation <= 0) break;
     roots = residuals.unaryExpr(
-        [&](double residual) { return std::sqrt(HuberWeight(residual, result.spread)); });
+        [&](double residual) { return std::sqrt(HuberWeight(residual, deviation)); });
   }
   return result;
 }
@@ -159,8 +161,8 @@ QuadraticFit FitQuadratic(const std::vector<CellSummary>& cells, const LandModel
   for (std::size_t t = 0; t < 5; ++t) {
     result.coefficients[t] = fit.solution(landTerms + static_cast<Eigen::Index>(t));
   }
-  result.before = SolveRobustly(terms.leftCols(landTerms), values).spread;
-  result.after = fit.spread;
+  result.before = SolveRobustly(terms.leftCols(landTerms), values).rootMeanSquare;
+  result.after = fit.rootMeanSquare;
   return result;
 }
 

@@ -30,7 +30,7 @@ class PositionMoments {
   std::array<double, 5> sums_{};  ///< of x^2, x y, y^2, x, y
 };
 
-/// One channel's quadratic, its constant left at 0, and how far (robust deviation) the cells are
+/// One channel's quadratic, its constant left at 0, and how far (root mean square) the cells are
 /// from what explains them, without the quadratic and with it.
 struct QuadraticFit {
   QuadraticCoefficients coefficients{};

@@ -4,6 +4,8 @@
 #include <algorithm>
 #include <cmath>
 #include <cstddef>
+#include <numeric>
+#include <utility>
 
 namespace zarn::app {
 
@@ -12,6 +14,15 @@ double Median(std::vector<double> values) {
   const auto middle = values.begin() + static_cast<std::ptrdiff_t>(values.size() / 2);
   std::nth_element(values.begin(), middle, values.end());
   return *middle;
+}
+
+double Mean(const std::vector<double>& values) {
+  return std::accumulate(values.begin(), values.end(), 0.0) / static_cast<double>(values.size());
+}
+
+double RootMeanSquare(const std::vector<double>& values) {
+  return std::sqrt(std::inner_product(values.begin(), values.end(), values.begin(), 0.0) /
+                   static_cast<double>(values.size()));
 }
 
 double RobustDeviation(std::vector<double> values) {
@@ -57,6 +68,13 @@ Moments WeightedMoments(std::span<const double> x, std::span<const double> y,
   m.deviationY = std::sqrt(yy / m.weight);
   if (xx > 0 && yy > 0) m.correlation = xy / std::sqrt(xx * yy);
   return m;
+}
+
+double SignalToNoise(const Moments& m) {
+  constexpr double kMost = 1e4;
+  if (!(m.correlation > 0) || m.deviationX <= 0 || m.deviationY <= 0) return 0;
+  const double explained = m.correlation * m.correlation;
+  return explained < 1 ? std::min(explained / (1 - explained), kMost) : kMost;
 }
 
 }  // namespace zarn::app

@@ -9,6 +9,12 @@ namespace zarn::app {
 /// The middle value (of an even number of values the upper one of the two); 0 for none.
 double Median(std::vector<double> values);
 
+/// The arithmetic mean; the values must not be empty.
+double Mean(const std::vector<double>& values);
+
+/// Root of the mean square; the values must not be empty.
+double RootMeanSquare(const std::vector<double>& values);
+
 /// Standard deviation as the median absolute deviation from the median tells it: half of the values
 /// may be anything.
 double RobustDeviation(std::vector<double> values);
@@ -33,5 +39,9 @@ struct Moments {
 };
 Moments WeightedMoments(std::span<const double> x, std::span<const double> y,
                         std::span<const double> weights);
+
+/// r^2 / (1 - r^2), the ratio of signal to noise that goes with a correlation r; 0 unless the two
+/// are positively correlated.
+double SignalToNoise(const Moments& m);
 
 }  // namespace zarn::app

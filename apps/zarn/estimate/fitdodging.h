@@ -1,0 +1,11 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace zarn::app {
+
+/// Adds the command `fit-dodging` to the program.
+void AddFitDodgingCommand(CLI::App& app);
+
+}  // namespace zarn::app
