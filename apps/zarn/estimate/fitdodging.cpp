@@ -168,8 +168,10 @@ void AddFitDodgingCommand(CLI::App& app) {
   CLI::App& command = *app.add_subcommand(
       "fit-dodging", "Estimates gain and offset surfaces that bring a raster onto a reference");
   const auto options = std::make_shared<FitDodgingOptions>();
-  command.add_option("REF", options->reference, "Raster that stays as it is")->required();
-  command.add_option("IN", options->input, "Raster to bring onto it")->required();
+  command.add_option("REF", options->reference, "Raster that stays as it is")
+      ->type_name("")
+      ->required();
+  command.add_option("IN", options->input, "Raster to bring onto it")->type_name("")->required();
   command
       .add_option("-o", options->output,
                   "Parameter file to write; the surfaces are written beside it, with .gain.tif "

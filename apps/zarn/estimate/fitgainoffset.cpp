@@ -170,8 +170,11 @@ void AddFitGainOffsetCommand(CLI::App& app) {
       "fit-gain-offset",
       "Estimates the gains and offsets that bring overlapping rasters onto a reference");
   const auto options = std::make_shared<FitGainOffsetOptions>();
-  command.add_option("REF", options->reference, "Raster that stays as it is")->required();
+  command.add_option("REF", options->reference, "Raster that stays as it is")
+      ->type_name("")
+      ->required();
   command.add_option("IN", options->inputs, "Rasters to bring onto it, directly or step by step")
+      ->type_name("")
       ->required();
   command.add_option("-o", options->output, "File to write for a single IN")->type_name("FILE");
   command

@@ -135,7 +135,7 @@ void AddFitHotSpotCommand(CLI::App& app) {
   CLI::App& command = *app.add_subcommand(
       "fit-hotspot", "Estimates the quadratic brightness bulge that zarn hotspot subtracts");
   const auto options = std::make_shared<FitHotSpotOptions>();
-  command.add_option("IN", options->input, "Raster with the bulge")->required();
+  command.add_option("IN", options->input, "Raster with the bulge")->type_name("")->required();
   command.add_option("-o", options->output, "File to write")->type_name("FILE")->required();
   command
       .add_option("--reference", options->reference,
