@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 
 namespace zarn::app {
 
@@ -62,11 +63,12 @@ const double* CellMeans::At(std::int64_t column, std::int64_t row) const {
 OverlapLattice ChooseLattice(const std::vector<Ground>& grounds, std::size_t channels, int side) {
   constexpr double kUsualSide = 8;
   constexpr double kEnoughCells = 4000;
-  constexpr double kMostBytes = 256 << 20;
-  constexpr Extent kNowhere{INFINITY, INFINITY, -INFINITY, -INFINITY};
+  constexpr double kMostBytes = 64 << 20;
+  constexpr double kInfinity = std::numeric_limits<double>::infinity();
+  constexpr Extent kNowhere{kInfinity, kInfinity, -kInfinity, -kInfinity};
 
   OverlapLattice result{{}, 0, std::vector<Extent>(grounds.size(), kNowhere)};
-  double smallest = INFINITY;
+  double smallest = kInfinity;
   for (std::size_t i = 0; i < grounds.size(); ++i) {
     for (std::size_t j = 0; j < i; ++j) {
       const Extent common = Intersection(grounds[i].Bounds(), grounds[j].Bounds());

@@ -30,6 +30,7 @@ Eigen::MatrixXd Features(const std::vector<CellSummary>& cells) {
   Eigen::Index feature = 0;
   for (std::size_t c = 0; c < channels; ++c) {
     std::vector<double> deviations;
+    deviations.reserve(cells.size());
     for (const CellSummary& cell : cells) deviations.push_back(cell.deviations[c]);
     // Roughness counts by ratios, but those of the smoothest cells are chance.
     const double floor = 0.1 * Median(std::move(deviations)) + std::numeric_limits<double>::min();
