@@ -41,7 +41,7 @@ void BalancePixels(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
 }
 
 /// Pixels that a correction is given at a time at most.
-inline constexpr std::size_t kRunPixels = 512;
+inline constexpr std::size_t kRunPixels = 256;
 
 #if ZARN_SIMD
 
@@ -54,7 +54,7 @@ template <typename T>
 class RunScratch {
  public:
   explicit RunScratch(std::size_t channels)
-      : run_(std::clamp<std::size_t>(4 * kRunPixels / std::max<std::size_t>(channels, 1) / 64 * 64,
+      : run_(std::clamp<std::size_t>(8 * kRunPixels / std::max<std::size_t>(channels, 1) / 64 * 64,
                                      64, kRunPixels)),
         samples_(Rows<T>(channels)),
         planes_(Rows<T>(channels)),
@@ -104,12 +104,35 @@ class RunScratch {
 /// Blocks of more bytes leave the caches before anybody reads them again.
 inline constexpr std::size_t kStreamedBytes = std::size_t{8} << 20;
 
-/// The loop that all fast balancers share: takes runs of pixels of one row apart into channels,
-/// calls `balance(run, excluded)` on these (in place, in `scratch.Planes()`), and puts them
-/// together again by the rules. `run` has no values yet.
-template <typename T, class Balance>
+/// Whether pixels may be excluded: false is certain, true is not, as single samples are looked at.
+template <typename T>
+bool MayExclude(const BalanceRules<T>& rules, const T* samples, std::size_t sampleCount,
+                const std::uint8_t* mask, std::size_t pixels) {
+  return (mask != nullptr && std::memchr(mask, 0, pixels) != nullptr) ||
+         (rules.inputNoData() != nullptr &&
+          AnySampleNear(samples, sampleCount, rules.inputNoData()[0]));
+}
+
+/// Asks for the memory of the pixels ahead while others are computed: the passes over a run keep
+/// the machine from looking ahead by itself.
+template <typename T>
+void Prefetch(const BalanceJob<T>& job, std::size_t begin, std::size_t end) {
+  constexpr std::size_t kCacheLine = 64;
+  const auto* const first = reinterpret_cast<const std::byte*>(job.input + begin * job.channels);
+  const auto* const last = reinterpret_cast<const std::byte*>(job.input + end * job.channels);
+  for (const std::byte* line = first; line < last; line += kCacheLine) __builtin_prefetch(line);
+}
+
+/// The loop that all fast balancers share, over runs of pixels of one row.
+///
+/// A run that certainly has no excluded pixels goes through `plain(pixels, count, results)`, where
+/// there is one (else pass nullptr): interleaved samples that stand in memory as they are. Others
+/// are taken apart into channels for `balance(run)`, which works in place in `scratch.Planes()` and
+/// gets a run without values, and are put together again by the rules.
+template <typename T, class Plain, class Balance>
 void ForEachRun(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
-                RunScratch<T>& scratch, const Balance& balance) {
+                RunScratch<T>& scratch, const Plain& plain, const Balance& balance) {
+  constexpr bool kHasPlain = !std::is_null_pointer_v<Plain>;
   const std::size_t channels = job.channels;
   const std::size_t pitch = scratch.Pitch();
   const BalanceRules<T>& rules = job.rules;
@@ -119,22 +142,28 @@ void ForEachRun(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
     const std::size_t column = i % job.width;
     const std::size_t count = std::min({scratch.Run(), job.width - column, end - i});
     T* const out = job.output + i * channels;
-    // Vectors may read past the run but not past the block.
+    // Vectors may read past the run, but not past the band: where the output is the input, another
+    // thread writes there.
     const T* in = job.input + i * channels;
     const std::uint8_t* mask = rules.mask() == nullptr ? nullptr : rules.mask() + i;
-    if (i + count + kSampleRowPadding > job.Pixels()) {
+    if (i + count + kSampleRowPadding > end) {
       in = std::copy_n(in, count * channels, scratch.Samples()) - count * channels;
       if (mask != nullptr) mask = std::copy_n(mask, count, scratch.Mask()) - count;
     }
-    T* const planes = scratch.Planes();
-    SplitChannels(in, count, channels, planes, pitch);
-    const bool any = tests && FlagExcluded(planes, pitch, count, channels, rules.inputNoData(),
-                                           mask, scratch.Flags());
-    const std::uint8_t* const flags = any ? scratch.Flags() : nullptr;
-    balance(PixelRun{nullptr, pitch, count, channels, column, i / job.width, flags});
-    ExcludedPixels<T> excluded{flags, rules.outputNoData(), scratch.Old()};
-    if (any && excluded.value == nullptr) std::copy_n(out, count * channels, scratch.Old());
-    JoinChannels(planes, pitch, count, channels, excluded, scratch.Samples());
+    if (kHasPlain && !(tests && MayExclude(rules, in, count * channels, mask, count))) {
+      if constexpr (kHasPlain) plain(in, count, scratch.Samples());
+    } else {
+      Prefetch(job, i + count, std::min(end, i + 2 * count));
+      T* const planes = scratch.Planes();
+      SplitChannels(in, count, channels, planes, pitch);
+      const bool any = tests && FlagExcluded(planes, pitch, count, channels, rules.inputNoData(),
+                                             mask, scratch.Flags());
+      const std::uint8_t* const flags = any ? scratch.Flags() : nullptr;
+      balance(PixelRun{nullptr, pitch, count, channels, column, i / job.width, flags});
+      const ExcludedPixels<T> excluded{flags, rules.outputNoData(), scratch.Old()};
+      if (any && excluded.value == nullptr) std::copy_n(out, count * channels, scratch.Old());
+      JoinChannels(planes, pitch, count, channels, excluded, scratch.Samples());
+    }
     const std::size_t bytes = count * channels * sizeof(T);
     if (streams) {
       StreamBytes(reinterpret_cast<const std::byte*>(scratch.Samples()), bytes,
@@ -147,11 +176,11 @@ void ForEachRun(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
   if (streams) FinishStreaming();
 }
 
-/// The same as `BalancePixels`, bit for bit.
-template <typename T, class Correction>
+/// The same as `BalancePixels`, bit for bit. `plain` as for `ForEachRun`.
+template <typename T, class Correction, class Plain>
 void BalanceRuns(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
-                 Correction& correction, RunScratch<T>& scratch) {
-  ForEachRun(job, begin, end, scratch, [&](PixelRun run) {
+                 Correction& correction, RunScratch<T>& scratch, const Plain& plain) {
+  ForEachRun(job, begin, end, scratch, plain, [&](PixelRun run) {
     run.values = scratch.Values();
     for (std::size_t c = 0; c < run.channels; ++c) {
       WidenSamples(scratch.Planes() + c * run.pitch, run.count, run.Channel(c));
@@ -188,9 +217,10 @@ void ForEachPixelBand(std::size_t pixels, const BalanceSharing& sharing, const P
 }
 
 /// Balances a block by a correction that may depend on the position. Each band has a copy of it.
-template <typename T, class Correction>
-void Balance(const BalanceJob<T>& job, const BalanceSharing& sharing,
-             const Correction& correction) {
+/// `plain` may do the same for interleaved samples, see `ForEachRun`.
+template <typename T, class Correction, class Plain = std::nullptr_t>
+void Balance(const BalanceJob<T>& job, const BalanceSharing& sharing, const Correction& correction,
+             [[maybe_unused]] const Plain& plain = nullptr) {
   if (job.Pixels() == 0 || job.channels == 0) return;
   std::vector<Correction> corrections;
 #if ZARN_SIMD
@@ -203,7 +233,7 @@ void Balance(const BalanceJob<T>& job, const BalanceSharing& sharing,
       };
       ForEachPixelBand(job.Pixels(), sharing, prepare,
                        [&](std::size_t band, std::size_t begin, std::size_t end) {
-                         BalanceRuns(job, begin, end, corrections[band], scratch[band]);
+                         BalanceRuns(job, begin, end, corrections[band], scratch[band], plain);
                        });
       return;
     }

@@ -7,6 +7,9 @@
 #include "host/sys/vectorised.h"
 #include "processes/filters/colorbalance/balanceblock.h"
 #include "processes/filters/colorbalance/mapsamples.h"
+#if ZARN_SIMD
+#include "processes/filters/colorbalance/gainoffsetcb_simd.h"
+#endif
 
 namespace zarn::processes::filters {
 namespace {
@@ -51,7 +54,15 @@ FilterResult CPUGainOffsetCB::Process(const gobs::Raster& input, gobs::Raster& o
         return job.converters[c](Balanced(static_cast<double>(v), gains[c], offsets[c]));
       });
     } else {
-      Balance(job, sharing, GainOffset{gains.data(), offsets.data()});
+      const GainOffset correction{gains.data(), offsets.data()};
+#if ZARN_SIMD
+      const GainOffsetPattern<T> pattern(gains.data(), offsets.data(), job.converters);
+      Balance(job, sharing, correction, [&](const T* pixels, std::size_t count, T* results) {
+        pattern.Apply(pixels, count * job.channels, results);
+      });
+#else
+      Balance(job, sharing, correction);
+#endif
     }
     return FilterResult::Success();
   });

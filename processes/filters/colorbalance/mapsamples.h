@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <vector>
@@ -28,8 +27,6 @@ void MapPixels(const BalanceJob<T>& job, std::size_t begin, std::size_t end, con
 #if ZARN_SIMD
 
 /// The result for each of the 256 samples of a byte type, by its bits.
-using ByteTable = std::array<std::uint8_t, 256>;
-
 template <typename T, class Map>
 ByteTable MakeByteTable(const Map& map, std::size_t channel) {
   static_assert(sizeof(T) == 1);
@@ -53,10 +50,14 @@ void MapBytes(const BalanceJob<T>& job, const BalanceSharing& sharing, const Map
   ForEachPixelBand(
       job.Pixels(), sharing, prepare, [&](std::size_t band, std::size_t begin, std::size_t end) {
         RunScratch<T>& own = scratch[band];
-        ForEachRun(job, begin, end, own, [&](const PixelRun& run) {
+        const auto plain = [&](const T* pixels, std::size_t count, T* results) {
+          LookUpBytes(reinterpret_cast<const std::uint8_t*>(pixels), count, job.channels,
+                      tables.data(), reinterpret_cast<std::uint8_t*>(results));
+        };
+        ForEachRun(job, begin, end, own, plain, [&](const PixelRun& run) {
           for (std::size_t c = 0; c < run.channels; ++c) {
             auto* const bytes = reinterpret_cast<std::uint8_t*>(own.Planes() + c * run.pitch);
-            LookUpBytes(bytes, run.count, tables[c].data());
+            LookUpBytes(bytes, run.count, 1, &tables[c], bytes);
           }
         });
       });

@@ -21,6 +21,7 @@
 // foreach_target.h must come first.
 #include <hwy/highway.h>
 
+#include "processes/filters/framework/outputconverter_simd.h"
 #include "processes/filters/framework/pixelvectors_simd.h"
 
 HWY_BEFORE_NAMESPACE();
@@ -118,92 +119,72 @@ HWY_ATTR void Widen(const T* samples, std::size_t count, double* values) {
   }
 }
 
-/// The rules of an output converter on vectors of doubles.
-template <typename T>
-class VectorConverter {
- public:
-  explicit VectorConverter(const OutputConverter<T>& converter)
-      : low_(static_cast<double>(converter.low())),
-        high_(static_cast<double>(converter.high())),
-        avoids_(converter.avoids()),
-        noData_(static_cast<double>(converter.noData())),
-        replacement_(avoids_ ? static_cast<double>(converter.replacement()) : 0.0) {}
-
-  template <class D>
-  HWY_INLINE void Store(D d, hn::Vec<D> v, T* to) const {
-    const auto low = hn::Set(d, low_);
-    const auto high = hn::Set(d, high_);
-    const hn::Rebind<T, D> dt;
-    if constexpr (std::is_floating_point_v<T>) {
-      v = hn::IfThenElse(hn::Lt(v, low), low, hn::IfThenElse(hn::Gt(v, high), high, v));
-      if constexpr (std::is_same_v<T, double>) {
-        hn::StoreU(Avoid(d, v), dt, to);
-      } else {
-        auto narrow = hn::DemoteTo(dt, v);
-        if (avoids_) narrow = hn::DemoteTo(dt, Avoid(d, hn::PromoteTo(d, narrow)));
-        hn::StoreU(narrow, dt, to);
-      }
-    } else {
-      // NaN fails the comparison and becomes the low bound.
-      v = hn::IfThenElse(hn::Ge(v, low), v, low);
-      v = hn::IfThenElse(hn::Gt(v, high), high, v);
-      // Next to 1.5 * 2^52 the unit in the last place is 1: the sum rounds to the nearest integer,
-      // ties to even, and its low bits hold that integer.
-      const auto magic = hn::Set(d, 6755399441055744.0);
-      auto shifted = hn::Add(v, magic);
-      if (avoids_) {
-        shifted = hn::IfThenElse(hn::Eq(shifted, hn::Set(d, noData_ + 6755399441055744.0)),
-                                 hn::Set(d, replacement_ + 6755399441055744.0), shifted);
-      }
-      const hn::Rebind<std::make_unsigned_t<T>, D> du;
-      hn::StoreU(hn::TruncateTo(du, hn::BitCast(hn::RebindToUnsigned<D>(), shifted)), du,
-                 reinterpret_cast<std::make_unsigned_t<T>*>(to));
-    }
-  }
-
- private:
-  template <class D>
-  HWY_INLINE hn::Vec<D> Avoid(D d, hn::Vec<D> v) const {
-    if (!avoids_) return v;
-    const auto touches = hn::Lt(hn::Abs(hn::Sub(v, hn::Set(d, noData_))), hn::Set(d, 1e-5));
-    return hn::IfThenElse(touches, hn::Set(d, replacement_), v);
-  }
-
-  double low_;
-  double high_;
-  bool avoids_;
-  double noData_;
-  double replacement_;
-};
-
 template <typename T>
 HWY_ATTR void Narrow(const double* values, std::size_t count, const OutputConverter<T>& converter,
                      T* samples) {
   const hn::ScalableTag<double> d;
-  const VectorConverter<T> convert(converter);
+  const ConverterConstants<T> constants(converter);
+  const ConverterVectors<T, decltype(d)> convert(d, constants);
   for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-    convert.Store(d, hn::LoadU(d, values + i), samples + i);
+    convert.Store(hn::LoadU(d, values + i), samples + i);
   }
 }
 
-HWY_ATTR void LookUp(std::uint8_t* bytes, std::size_t count, const std::uint8_t* table) {
-#if HWY_TARGET == HWY_SCALAR || HWY_TARGET == HWY_EMU128
-  for (std::size_t i = 0; i < count; ++i) bytes[i] = table[bytes[i]];
-#else
-  const hn::ScalableTag<std::uint8_t> d;
-  for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-    const auto v = hn::LoadU(d, bytes + i);
-    auto result = hn::Zero(d);
-    for (std::size_t part = 0; part < 256; part += 16) {
-      // 0 .. 15 for the bytes of this part, whose sum with 0x70 stays below 0x80; the lookup gives
-      // 0 for all others.
-      const auto own = hn::Xor(v, hn::Set(d, static_cast<std::uint8_t>(part)));
-      const auto index = hn::SaturatedAdd(own, hn::Set(d, 0x70));
-      result = hn::Or(result, hn::TableLookupBytesOr0(hn::LoadDup128(d, table + part), index));
-    }
-    hn::StoreU(result, d, bytes + i);
-  }
+#if HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128
+// All sixteen parts of the table are looked up by the low four bits; the high bits choose.
+template <class D>
+HWY_INLINE hn::Vec<D> LookUpVector(D d, hn::Vec<D> v, const std::uint8_t* table) {
+  const auto low = hn::And(v, hn::Set(d, 0x0F));
+  const auto bit4 = hn::TestBit(v, hn::Set(d, 0x10));
+  const auto bit5 = hn::TestBit(v, hn::Set(d, 0x20));
+  const auto bit6 = hn::TestBit(v, hn::Set(d, 0x40));
+  const auto bit7 = hn::TestBit(v, hn::Set(d, 0x80));
+  const auto part = [&](std::size_t p) HWY_ATTR {
+    return hn::TableLookupBytes(hn::LoadDup128(d, table + 16 * p), low);
+  };
+  const auto two = [&](std::size_t p)
+                       HWY_ATTR { return hn::IfThenElse(bit4, part(p + 1), part(p)); };
+  const auto four = [&](std::size_t p)
+                        HWY_ATTR { return hn::IfThenElse(bit5, two(p + 2), two(p)); };
+  const auto eight = [&](std::size_t p)
+                         HWY_ATTR { return hn::IfThenElse(bit6, four(p + 4), four(p)); };
+  return hn::IfThenElse(bit7, eight(8), eight(0));
+}
 #endif
+
+HWY_ATTR void LookUp(const std::uint8_t* pixels, std::size_t count, std::size_t channels,
+                     const ByteTable* tables, std::uint8_t* results) {
+#if HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128
+  const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
+    constexpr std::size_t kChannels = constant();
+    using D = hn::ScalableTag<std::uint8_t>;
+    const D d;
+    for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
+      for (std::size_t c = 0; c < kChannels; ++c) {
+        hwy::Prefetch(pixels + i * kChannels + kBytesAhead + c * hn::Lanes(d));
+      }
+      PixelVectors<D, kChannels> v(d, pixels + i * kChannels);
+      for (std::size_t c = 0; c < kChannels; ++c) {
+        v.channel[c] = LookUpVector(d, v.channel[c], tables[c].data());
+      }
+      v.Store(results + i * kChannels);
+    }
+  });
+  if (done) return;
+#endif
+  for (std::size_t i = 0; i < count * channels; ++i) results[i] = tables[i % channels][pixels[i]];
+}
+
+template <typename T>
+HWY_ATTR bool AnyNear(const T* samples, std::size_t count, T value) {
+  using Lane = std::conditional_t<std::is_same_v<T, float>, double, T>;
+  const hn::ScalableTag<Lane> d;
+  const std::size_t lanes = hn::Lanes(d);
+  auto any = hn::MaskFromVec(hn::Zero(d));
+  std::size_t i = 0;
+  for (; i + lanes <= count; i += lanes) any = hn::Or(any, NearlyEqual(d, samples + i, value));
+  const auto rest = hn::And(NearlyEqual(d, samples + i, value), hn::FirstN(d, count - i));
+  return !hn::AllFalse(d, hn::Or(any, rest));
 }
 
 HWY_ATTR void StreamAligned(const std::byte* from, std::size_t size, std::byte* to) {
@@ -228,6 +209,9 @@ HWY_ATTR void StreamAligned(const std::byte* from, std::size_t size, std::byte* 
   bool Flag##name(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,    \
                   const T* noData, const std::uint8_t* mask, std::uint8_t* flags) {               \
     return Flag(planes, pitch, count, channels, noData, mask, flags);                             \
+  }                                                                                               \
+  bool AnyNear##name(const T* samples, std::size_t count, T value) {                              \
+    return AnyNear(samples, count, value);                                                        \
   }                                                                                               \
   void Widen##name(const T* samples, std::size_t count, double* values) {                         \
     Widen(samples, count, values);                                                                \
@@ -255,6 +239,7 @@ namespace zarn::processes::filters {
   HWY_EXPORT(Split##name);                                                                        \
   HWY_EXPORT(Join##name);                                                                         \
   HWY_EXPORT(Flag##name);                                                                         \
+  HWY_EXPORT(AnyNear##name);                                                                      \
   HWY_EXPORT(Widen##name);                                                                        \
   HWY_EXPORT(Narrow##name);                                                                       \
   template <>                                                                                     \
@@ -275,6 +260,10 @@ namespace zarn::processes::filters {
     return HWY_DYNAMIC_DISPATCH(Flag##name)(planes, pitch, count, channels, noData, mask, flags); \
   }                                                                                               \
   template <>                                                                                     \
+  ZARN_HIDDEN bool AnySampleNear(const T* samples, std::size_t count, T value) {                  \
+    return HWY_DYNAMIC_DISPATCH(AnyNear##name)(samples, count, value);                            \
+  }                                                                                               \
+  template <>                                                                                     \
   ZARN_HIDDEN void WidenSamples(const T* samples, std::size_t count, double* values) {            \
     HWY_DYNAMIC_DISPATCH(Widen##name)(samples, count, values);                                    \
   }                                                                                               \
@@ -289,8 +278,9 @@ HWY_EXPORT(Vectors);
 bool HasVectors() { return HWY_DYNAMIC_DISPATCH(Vectors)(); }
 
 HWY_EXPORT(LookUp);
-void LookUpBytes(std::uint8_t* bytes, std::size_t count, const std::uint8_t* table) {
-  HWY_DYNAMIC_DISPATCH(LookUp)(bytes, count, table);
+void LookUpBytes(const std::uint8_t* pixels, std::size_t count, std::size_t channels,
+                 const ByteTable* tables, std::uint8_t* results) {
+  HWY_DYNAMIC_DISPATCH(LookUp)(pixels, count, channels, tables, results);
 }
 
 HWY_EXPORT(StreamAligned);

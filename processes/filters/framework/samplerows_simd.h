@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
 
@@ -11,6 +12,10 @@ namespace zarn::processes::filters {
 /// Vector loops over runs of samples, for the eight sample types up to 32 bits and double. All rows
 /// are padded: they may be read and written up to this many elements past the length given.
 inline constexpr std::size_t kSampleRowPadding = 64;
+
+/// How far ahead loops over large blocks ask for memory: results that are written in between keep
+/// the machine from looking ahead by itself.
+inline constexpr std::size_t kBytesAhead = 2048;
 
 /// Whether this machine has vectors at all: emulated ones would be slower than plain loops.
 bool HasVectors();
@@ -39,6 +44,10 @@ template <typename T>
 bool FlagExcluded(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
                   const T* noData, const std::uint8_t* mask, std::uint8_t* flags);
 
+/// Whether any of the samples nearly equals `value`.
+template <typename T>
+bool AnySampleNear(const T* samples, std::size_t count, T value);
+
 /// Samples as doubles.
 template <typename T>
 void WidenSamples(const T* samples, std::size_t count, double* values);
@@ -48,8 +57,13 @@ template <typename T>
 void NarrowSamples(const double* values, std::size_t count, const OutputConverter<T>& converter,
                    T* samples);
 
-/// Replaces each byte by its entry in the table of 256.
-void LookUpBytes(std::uint8_t* bytes, std::size_t count, const std::uint8_t* table);
+/// What becomes of each of the 256 values of a byte.
+using ByteTable = std::array<std::uint8_t, 256>;
+
+/// Looks up each byte of `count` interleaved pixels in its channel's table. The results may take
+/// the place of the pixels.
+void LookUpBytes(const std::uint8_t* pixels, std::size_t count, std::size_t channels,
+                 const ByteTable* tables, std::uint8_t* results);
 
 /// Copies `size` bytes past the caches; for results that are too large to stay in them. The regions
 /// do not overlap. `FinishStreaming` comes before the thread lets others see them.

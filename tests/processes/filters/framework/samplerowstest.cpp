@@ -111,6 +111,8 @@ class SampleRows : public ::testing::TestWithParam<std::int64_t> {
           expectedAny = expectedAny || expected;
         }
         ASSERT_EQ(any, expectedAny) << count;
+        if (masked || channels > 1) continue;
+        ASSERT_EQ(AnySampleNear(planes.data(), count, T{0}), expectedAny) << count;
       }
     }
   }
@@ -166,14 +168,17 @@ TEST_P(SampleRows, EqualPlainLoops) {
 }
 
 TEST_P(SampleRows, LookUpEveryByte) {
-  std::vector<std::uint8_t> table(256);
-  for (std::uint8_t& entry : table) entry = static_cast<std::uint8_t>(random_.Below(256));
+  std::vector<ByteTable> tables(5);
+  for (ByteTable& table : tables) {
+    for (std::uint8_t& entry : table) entry = static_cast<std::uint8_t>(random_.Below(256));
+  }
   for (std::size_t count = 1; count <= 300; ++count) {
-    std::vector<std::uint8_t> bytes(count + kSampleRowPadding);
-    for (std::size_t i = 0; i < count; ++i) bytes[i] = static_cast<std::uint8_t>(i * 7);
-    LookUpBytes(bytes.data(), count, table.data());
-    for (std::size_t i = 0; i < count; ++i) {
-      ASSERT_EQ(bytes[i], table[static_cast<std::uint8_t>(i * 7)]);
+    const std::size_t channels = 1 + count % 5;
+    std::vector<std::uint8_t> bytes((count + kSampleRowPadding) * channels);
+    for (std::size_t i = 0; i < bytes.size(); ++i) bytes[i] = static_cast<std::uint8_t>(i * 7);
+    LookUpBytes(bytes.data(), count, channels, tables.data(), bytes.data());
+    for (std::size_t i = 0; i < count * channels; ++i) {
+      ASSERT_EQ(bytes[i], tables[i % channels][static_cast<std::uint8_t>(i * 7)]);
     }
   }
 }
