@@ -10,6 +10,7 @@
 #include <string>
 
 #include "apps/zarn/average.h"
+#include "apps/zarn/dodge.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/estimate/fitdodging.h"
 #include "apps/zarn/estimate/fitgainoffset.h"
@@ -54,6 +55,7 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddLutCommand(app);
   zarn::app::AddMinMaxLutCommand(app);
   zarn::app::AddPolynomialCommand(app);
+  zarn::app::AddDodgeCommand(app);
   zarn::app::AddHotSpotCommand(app);
   zarn::app::AddSampleCommand(app);
 }

@@ -140,6 +140,12 @@ const json& ParameterObject::ListAt(const std::string& key, const std::vector<st
   return list;
 }
 
+std::string ParameterObject::Text(const std::string& key) const {
+  const json& value = At(key, "a string");
+  if (!value.is_string() || value.get<std::string>().empty()) Refuse(key, "a string");
+  return value.get<std::string>();
+}
+
 double ParameterObject::Number(const std::string& key) const {
   const json& value = At(key, "a number");
   if (!value.is_number()) Refuse(key, "a number");

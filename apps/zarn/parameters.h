@@ -19,6 +19,8 @@ class ParameterObject {
                   const std::vector<std::string>& keys);
 
   bool Has(const std::string& key) const;
+  /// A string that is not empty.
+  std::string Text(const std::string& key) const;
   /// A finite number.
   double Number(const std::string& key) const;
   /// Finite numbers, as many as one of `lengths`.

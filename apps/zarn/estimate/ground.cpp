@@ -21,6 +21,8 @@ std::string NameOf(const OGRSpatialReference& system) {
   return coded ? std::string(authority) + ":" + code : name != nullptr ? name : "unnamed";
 }
 
+}  // namespace
+
 void RequireSameSystem(const RasterSource& first, const RasterSource& other) {
   const OGRSpatialReference* const a = first.Dataset().GetSpatialRef();
   const OGRSpatialReference* const b = other.Dataset().GetSpatialRef();
@@ -37,6 +39,8 @@ void RequireSameSystem(const RasterSource& first, const RasterSource& other) {
                    first.Name() + " (" + NameOf(*a) + "); reproject it first with gdalwarp -t_srs");
   }
 }
+
+namespace {
 
 void RequireComparable(const RasterSource& first, const RasterSource& other) {
   if (other.Type() != first.Type()) {

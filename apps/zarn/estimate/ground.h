@@ -60,6 +60,9 @@ class Ground {
   Extent bounds_;
 };
 
+/// Throws `RunError` unless both images name the same coordinate system, or neither names one.
+void RequireSameSystem(const RasterSource& first, const RasterSource& other);
+
 /// The grounds of images that are to be compared pixel by pixel. Throws `RunError` unless all have
 /// the sample type, the number of channels and the coordinate system of the first one. Images
 /// without georeference are taken to lie on one another and must be of one size.

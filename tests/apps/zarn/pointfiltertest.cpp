@@ -111,6 +111,26 @@ Corrected LessHotSpot(const Sample& s, double columnDivisor, double rowDivisor) 
   return {s.v - ((y * p[1] + p[3] + x * p[0]) * x + y * p[2] * y + y * p[4] + p[5])};
 }
 
+// Surfaces that are exactly linear between nodes 128 pixels apart.
+double Gain(double x, double y) { return 0.5 + x / 256 + y / 512; }
+double Offset(int band, double x) { return (band == 0 ? -8 : 3) + x / 128; }
+
+void WriteSurface(const std::string& file, int bands, double turn,
+                  const std::function<double(int band, double x, double y)>& value) {
+  Image surface(4, 2, bands, GDT_Float32);
+  for (int j = 0; j < 2; ++j) {
+    for (int i = 0; i < 4; ++i) {
+      for (int band = 0; band < bands; ++band) {
+        surface.At(i, j, band) = value(band, 128 * i, 128 * j);
+      }
+    }
+  }
+  Write(surface, file, {}, [&](GDALDataset& dataset) {
+    double transform[] = {-63.5, 128, turn, -63.5, -turn, 128};
+    dataset.SetGeoTransform(transform);
+  });
+}
+
 std::vector<Command> Commands() {
   const std::string spots =
       R"("channels":[{"coefficients":[-60,5,-61.5,60,59,3]},{"coefficients":[9,-4,8,1,2,-30]}]})";
@@ -162,6 +182,21 @@ std::vector<Command> Commands() {
        R"({"columnDivisor":150,"rowDivisor":70,)" + spots,
        [](const Sample& s) { return LessHotSpot(s, 150, 70); }},
       {"hotspot", {}, "{" + spots, [](const Sample& s) { return LessHotSpot(s, kColumns, kRows); }},
+      {"dodge",
+       {},
+       R"({"type":2,"gainSurface":"gain.tif","offsetSurface":"offset.tif",
+           "channels":[{"d0":60,"d1":4.5,"d2":30,"d3":7.5,"d4":0.75,"d5":1}]})",
+       [](const Sample& s) {
+         const double a = s.v * 0.75 + 1 - 60;
+         return Corrected{a * 1.25 * Gain(s.x, s.y) + 60 + (4.5 + Offset(s.band, s.x))};
+       }},
+      {"dodge",
+       {},
+       R"({"type":0,"offsetSurface":"offset.tif","channels":[{"d1":2},{"d1":-3,"d4":0.5}]})",
+       [](const Sample& s) {
+         return Corrected{s.v * (s.band == 0 ? 1 : 0.5) +
+                          ((s.band == 0 ? 2 : -3) + Offset(s.band, s.x))};
+       }},
   };
 }
 
@@ -252,6 +287,9 @@ TEST_F(PointFilter, EqualsItsFormulaInAnyWindowsAndThreads) {
   Image mask(kColumns, kRows, 1, GDT_Byte);
   for (std::size_t i = 0; i < mask.values.size(); ++i) mask.values[i] = i / 40 % 9 == 0 ? 0 : 1;
   Write(mask, folder_ / "mask.tif");
+  WriteSurface(folder_ / "gain.tif", 1, 0, [](int, double x, double y) { return Gain(x, y); });
+  WriteSurface(folder_ / "offset.tif", 2, 0,
+               [](int band, double x, double) { return Offset(band, x); });
   // Shifted from case to case, so that every command meets all of them.
   const std::vector<Arguments> pieces{{"--threads", "2"},
                                       {"--window", "37x11", "--threads", "2"},
@@ -323,7 +361,8 @@ TEST_F(PointFilter, HandlesWideIntegersWhereTheFilterDoes) {
 TEST_F(PointFilter, ReadsItsOwnExamples) {
   const Image image = NoiseImage(60, 40, 3, GDT_UInt16, 0, 3);
   Write(image, folder_ / "in.tif", {}, DeclareNoData(0));
-  for (const char* const name : {"gain-offset", "lut", "minmax-lut", "polynomial", "hotspot"}) {
+  for (const char* const name :
+       {"gain-offset", "lut", "minmax-lut", "polynomial", "hotspot", "dodge"}) {
     SCOPED_TRACE(name);
     const Outcome example = RunProgram({name, "--example"});
     ASSERT_EQ(example.status, 0) << example.err;
@@ -380,6 +419,10 @@ TEST_F(PointFilter, RefusesWrongParametersInOneLine) {
   const std::string good = R"({"channels":[{"gain":1,"offset":0}]})";
   const std::string table = R"("table":)" + TableText(0);
   const std::string entry = TableText(0).substr(0, 3) + ",300" + TableText(0).substr(6);
+  const auto one = [](int, double, double) { return 1; };
+  WriteSurface(folder_ / "turned.tif", 1, 9, one);
+  WriteSurface(folder_ / "two.tif", 2, 0, one);
+  WriteSurface(folder_ / "nan.tif", 1, 0, [](int, double x, double) { return x > 0 ? 1 : kNaN; });
   struct Case {
     const char* command;
     std::string params;
@@ -478,6 +521,16 @@ TEST_F(PointFilter, RefusesWrongParametersInOneLine) {
        {in},
        2,
        "'coefficients[5]': expected a number, found null"},
+      {"dodge", R"({"type":3,"channels":[{}]})", {in}, 2, "'type': expected 0, 1 or 2, found 3"},
+      {"dodge", R"({"type":2,"channels":[{"d2":0}]})", {in}, 2, "'d2': expected a number other"},
+      {"dodge",
+       R"({"type":2,"gainSurface":"no.tif","channels":[{}]})",
+       {in},
+       1,
+       "no.tif: No such file"},
+      {"dodge", R"({"type":0,"offsetSurface":"turned.tif","channels":[{}]})", {in}, 1, "is turned"},
+      {"dodge", R"({"type":0,"offsetSurface":"two.tif","channels":[{}]})", {in}, 1, "has 2 bands"},
+      {"dodge", R"({"type":0,"offsetSurface":"nan.tif","channels":[{}]})", {in}, 1, "not finite"},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.command + (" " + c.params.substr(0, 80)));
