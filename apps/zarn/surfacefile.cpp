@@ -33,14 +33,14 @@ DodgingGrid PlaceNodes(const RasterSource& file, const RasterSource& image) {
   const PixelPoint first = NodeInImage(surfaceGround, imageGround, 0, 0);
   const PixelPoint right = NodeInImage(surfaceGround, imageGround, 1, 0);
   const PixelPoint below = NodeInImage(surfaceGround, imageGround, 0, 1);
-  const DodgingGrid grid{.columns = static_cast<unsigned>(file.Width()),
-                         .rows = static_cast<unsigned>(file.Height()),
-                         .channels = static_cast<unsigned>(image.Channels().size()),
-                         .originX = first.column,
-                         .originY = first.row,
-                         .stepX = right.column - first.column,
-                         .stepY = below.row - first.row,
-                         .values = {}};
+  DodgingGrid grid{.columns = static_cast<unsigned>(file.Width()),
+                   .rows = static_cast<unsigned>(file.Height()),
+                   .channels = static_cast<unsigned>(image.Channels().size()),
+                   .originX = first.column,
+                   .originY = first.row,
+                   .stepX = right.column - first.column,
+                   .stepY = below.row - first.row,
+                   .values = {}};
   // Over the whole grid a node may stray by a tenth of a pixel from where parallel axes put it.
   const double stray = std::max(std::abs(right.row - first.row) * file.Width(),
                                 std::abs(below.column - first.column) * file.Height());
