@@ -40,14 +40,22 @@ struct Axis {
   double lastNode;
 };
 
-// Interpolates between the values a and b of two neighbouring nodes.
+constexpr unsigned kPiece = 256;
+
+// How far the pixels of a cell lie from its left nodes to its right ones.
 ZARN_VECTORISED
-void FillCell(const Axis& x, double node, unsigned column, unsigned count, double a, double b,
-              float* values) {
+void PlaceInCell(const Axis& x, double node, unsigned column, unsigned count, double* fractions) {
   const Axis axis = x;
   for (unsigned k = 0; k < count; ++k) {
-    const double position = PositionOf(column + k, axis.origin, axis.step, axis.lastNode);
-    values[k] = static_cast<float>(Between(a, b, position - node));
+    fractions[k] = PositionOf(column + k, axis.origin, axis.step, axis.lastNode) - node;
+  }
+}
+
+// Interpolates between the values a and b of two neighbouring nodes.
+ZARN_VECTORISED
+void FillCell(const double* fractions, unsigned count, double a, double b, float* values) {
+  for (unsigned k = 0; k < count; ++k) {
+    values[k] = static_cast<float>(Between(a, b, fractions[k]));
   }
 }
 
@@ -91,12 +99,14 @@ void GridDodgingSurface::GetBilinearRun(unsigned column, unsigned row, unsigned 
   // All pixels between the same two columns of nodes share the interpolations along these.
   for (unsigned k = 0; k < count;) {
     const std::size_t node = PlaceOf(column + k, x.origin, x.step, grid_.columns).node;
-    const unsigned end = EndOfCell(column, k, count, node);
+    const unsigned end = EndOfCell(column, k, k + std::min(count - k, kPiece), node);
+    double fractions[kPiece];
+    PlaceInCell(x, static_cast<double>(node), column + k, end - k, fractions);
     for (std::size_t c = 0; c < channels; ++c) {
       const std::size_t i = node * channels + c;
       const double a = Between(upper[i], lower[i], y.fraction);
       const double b = Between(upper[i + right], lower[i + right], y.fraction);
-      FillCell(x, static_cast<double>(node), column + k, end - k, a, b, values + c * pitch + k);
+      FillCell(fractions, end - k, a, b, values + c * pitch + k);
     }
     k = end;
   }

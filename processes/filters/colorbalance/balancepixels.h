@@ -104,7 +104,8 @@ class RunScratch {
 /// Blocks of more bytes leave the caches before anybody reads them again.
 inline constexpr std::size_t kStreamedBytes = std::size_t{8} << 20;
 
-/// Whether pixels may be excluded: false is certain, true is not, as single samples are looked at.
+/// Whether pixels of a run may be excluded: false is certain, true is not, as single samples are
+/// looked at.
 template <typename T>
 bool MayExclude(const BalanceRules<T>& rules, const T* samples, std::size_t sampleCount,
                 const std::uint8_t* mask, std::size_t pixels) {
@@ -123,21 +124,16 @@ void Prefetch(const BalanceJob<T>& job, std::size_t begin, std::size_t end) {
   for (const std::byte* line = first; line < last; line += kCacheLine) __builtin_prefetch(line);
 }
 
-/// The loop that all fast balancers share, over runs of pixels of one row.
-///
-/// A run that certainly has no excluded pixels goes through `plain(pixels, count, results)`, where
-/// there is one (else pass nullptr): interleaved samples that stand in memory as they are. Others
-/// are taken apart into channels for `balance(run)`, which works in place in `scratch.Planes()` and
-/// gets a run without values, and are put together again by the rules.
-template <typename T, class Plain, class Balance>
+/// The loop that all fast balancers share: over runs of pixels of one row, `compute(pixels, run,
+/// excluded)` brings their results, interleaved, to `scratch.Samples()`, where `pixels` may stand
+/// too. With `kSplit` the channels stand in `scratch.Planes()`; `run` has no values yet.
+template <bool kSplit, typename T, class Compute>
 void ForEachRun(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
-                RunScratch<T>& scratch, const Plain& plain, const Balance& balance) {
-  constexpr bool kHasPlain = !std::is_null_pointer_v<Plain>;
+                RunScratch<T>& scratch, const Compute& compute) {
   const std::size_t channels = job.channels;
-  const std::size_t pitch = scratch.Pitch();
   const BalanceRules<T>& rules = job.rules;
-  const bool streams = job.Pixels() * channels * sizeof(T) > kStreamedBytes;
-  const bool tests = rules.mask() != nullptr || rules.inputNoData() != nullptr;
+  const std::size_t pixelBytes = channels * sizeof(T);
+  const bool streams = job.Pixels() * pixelBytes > kStreamedBytes;
   for (std::size_t i = begin; i < end;) {
     const std::size_t column = i % job.width;
     const std::size_t count = std::min({scratch.Run(), job.width - column, end - i});
@@ -150,46 +146,61 @@ void ForEachRun(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
       in = std::copy_n(in, count * channels, scratch.Samples()) - count * channels;
       if (mask != nullptr) mask = std::copy_n(mask, count, scratch.Mask()) - count;
     }
-    if (kHasPlain && !(tests && MayExclude(rules, in, count * channels, mask, count))) {
-      if constexpr (kHasPlain) plain(in, count, scratch.Samples());
-    } else {
-      Prefetch(job, i + count, std::min(end, i + 2 * count));
-      T* const planes = scratch.Planes();
-      SplitChannels(in, count, channels, planes, pitch);
-      const bool any = tests && FlagExcluded(planes, pitch, count, channels, rules.inputNoData(),
-                                             mask, scratch.Flags());
-      const std::uint8_t* const flags = any ? scratch.Flags() : nullptr;
-      balance(PixelRun{nullptr, pitch, count, channels, column, i / job.width, flags});
-      const ExcludedPixels<T> excluded{flags, rules.outputNoData(), scratch.Old()};
-      if (any && excluded.value == nullptr) std::copy_n(out, count * channels, scratch.Old());
-      JoinChannels(planes, pitch, count, channels, excluded, scratch.Samples());
+    const bool tests = MayExclude(rules, in, count * channels, mask, count);
+    if (kSplit) Prefetch(job, i + count, std::min(end, i + 2 * count));
+    if (kSplit || tests) {
+      SplitChannels(in, count, channels, scratch.Planes(), scratch.Pitch());
     }
-    const std::size_t bytes = count * channels * sizeof(T);
+    const bool any = tests && FlagExcluded(scratch.Planes(), scratch.Pitch(), count, channels,
+                                           rules.inputNoData(), mask, scratch.Flags());
+    const std::uint8_t* const flags = any ? scratch.Flags() : nullptr;
+    if (any && rules.outputNoData() == nullptr) {
+      std::copy_n(out, count * channels, scratch.Old());
+    }
+    compute(in, PixelRun{nullptr, scratch.Pitch(), count, channels, column, i / job.width, flags},
+            ExcludedPixels<T>{flags, rules.outputNoData(), scratch.Old()});
     if (streams) {
-      StreamBytes(reinterpret_cast<const std::byte*>(scratch.Samples()), bytes,
+      StreamBytes(reinterpret_cast<const std::byte*>(scratch.Samples()), count * pixelBytes,
                   reinterpret_cast<std::byte*>(out));
     } else {
-      std::memcpy(out, scratch.Samples(), bytes);
+      std::memcpy(out, scratch.Samples(), count * pixelBytes);
     }
     i += count;
   }
   if (streams) FinishStreaming();
 }
 
-/// The same as `BalancePixels`, bit for bit. `plain` as for `ForEachRun`.
-template <typename T, class Correction, class Plain>
+/// The same as `BalancePixels`, bit for bit.
+template <typename T, class Correction>
 void BalanceRuns(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
-                 Correction& correction, RunScratch<T>& scratch, const Plain& plain) {
-  ForEachRun(job, begin, end, scratch, plain, [&](PixelRun run) {
+                 Correction& correction, RunScratch<T>& scratch) {
+  const auto compute = [&](const T*, PixelRun run, const ExcludedPixels<T>& excluded) {
+    T* const planes = scratch.Planes();
     run.values = scratch.Values();
     for (std::size_t c = 0; c < run.channels; ++c) {
-      WidenSamples(scratch.Planes() + c * run.pitch, run.count, run.Channel(c));
+      WidenSamples(planes + c * run.pitch, run.count, run.Channel(c));
     }
     correction.Run(run);
     for (std::size_t c = 0; c < run.channels; ++c) {
-      NarrowSamples(run.Channel(c), run.count, job.converters[c], scratch.Planes() + c * run.pitch);
+      NarrowSamples(run.Channel(c), run.count, job.converters[c], planes + c * run.pitch);
     }
-  });
+    JoinChannels(planes, run.pitch, run.count, run.channels, excluded, scratch.Samples());
+  };
+  ForEachRun<true>(job, begin, end, scratch, compute);
+}
+
+/// Balances interleaved samples as they stand in memory: `map(samples, count, results)` for all
+/// pixels of a run; what it makes of excluded ones is replaced.
+template <typename T, class Map>
+void MapRuns(const BalanceJob<T>& job, std::size_t begin, std::size_t end, const Map& map,
+             RunScratch<T>& scratch) {
+  const auto compute = [&](const T* in, const PixelRun& run, const ExcludedPixels<T>& excluded) {
+    map(in, run.count, scratch.Samples());
+    if (excluded.flags != nullptr) {
+      ReplaceExcluded(excluded, run.count, run.channels, scratch.Samples());
+    }
+  };
+  ForEachRun<false>(job, begin, end, scratch, compute);
 }
 
 #endif
@@ -216,25 +227,54 @@ void ForEachPixelBand(std::size_t pixels, const BalanceSharing& sharing, const P
       });
 }
 
+#if ZARN_SIMD
+/// Whether blocks of these samples have vector loops on this machine.
+template <typename T>
+bool RunsAreFast() {
+  return kHasSampleRows<T> && HasVectors();
+}
+
+/// Calls `work(band, begin, end, scratch)` for contiguous bands of pixels, each with scratch of its
+/// own; `prepare(bands)` comes first.
+template <typename T, typename Prepare, typename Work>
+void ForEachBandOfRuns(const BalanceJob<T>& job, const BalanceSharing& sharing,
+                       const Prepare& prepare, const Work& work) {
+  std::vector<RunScratch<T>> scratch;
+  const auto prepareAll = [&](std::size_t bands) {
+    prepare(bands);
+    for (std::size_t b = 0; b < bands; ++b) scratch.emplace_back(job.channels);
+  };
+  ForEachPixelBand(job.Pixels(), sharing, prepareAll,
+                   [&](std::size_t band, std::size_t begin, std::size_t end) {
+                     work(band, begin, end, scratch[band]);
+                   });
+}
+
+/// Balances a block by `map`, see `MapRuns`.
+template <typename T, class Map>
+void MapBlock(const BalanceJob<T>& job, const BalanceSharing& sharing, const Map& map) {
+  ForEachBandOfRuns(
+      job, sharing, [](std::size_t) {},
+      [&](std::size_t, std::size_t begin, std::size_t end, RunScratch<T>& scratch) {
+        MapRuns(job, begin, end, map, scratch);
+      });
+}
+#endif
+
 /// Balances a block by a correction that may depend on the position. Each band has a copy of it.
-/// `plain` may do the same for interleaved samples, see `ForEachRun`.
-template <typename T, class Correction, class Plain = std::nullptr_t>
-void Balance(const BalanceJob<T>& job, const BalanceSharing& sharing, const Correction& correction,
-             [[maybe_unused]] const Plain& plain = nullptr) {
+template <typename T, class Correction>
+void Balance(const BalanceJob<T>& job, const BalanceSharing& sharing,
+             const Correction& correction) {
   if (job.Pixels() == 0 || job.channels == 0) return;
   std::vector<Correction> corrections;
 #if ZARN_SIMD
   if constexpr (kHasSampleRows<T>) {
-    if (HasVectors()) {
-      std::vector<RunScratch<T>> scratch;
-      const auto prepare = [&](std::size_t bands) {
-        corrections.assign(bands, correction);
-        for (std::size_t b = 0; b < bands; ++b) scratch.emplace_back(job.channels);
-      };
-      ForEachPixelBand(job.Pixels(), sharing, prepare,
-                       [&](std::size_t band, std::size_t begin, std::size_t end) {
-                         BalanceRuns(job, begin, end, corrections[band], scratch[band], plain);
-                       });
+    if (RunsAreFast<T>()) {
+      ForEachBandOfRuns(
+          job, sharing, [&](std::size_t bands) { corrections.assign(bands, correction); },
+          [&](std::size_t band, std::size_t begin, std::size_t end, RunScratch<T>& scratch) {
+            BalanceRuns(job, begin, end, corrections[band], scratch);
+          });
       return;
     }
   }

@@ -54,15 +54,16 @@ FilterResult CPUGainOffsetCB::Process(const gobs::Raster& input, gobs::Raster& o
         return job.converters[c](Balanced(static_cast<double>(v), gains[c], offsets[c]));
       });
     } else {
-      const GainOffset correction{gains.data(), offsets.data()};
 #if ZARN_SIMD
-      const GainOffsetPattern<T> pattern(gains.data(), offsets.data(), job.converters);
-      Balance(job, sharing, correction, [&](const T* pixels, std::size_t count, T* results) {
-        pattern.Apply(pixels, count * job.channels, results);
-      });
-#else
-      Balance(job, sharing, correction);
+      if (RunsAreFast<T>() && job.Pixels() > 0 && job.channels > 0) {
+        const GainOffsetPattern<T> pattern(gains.data(), offsets.data(), job.converters);
+        MapBlock(job, sharing, [&](const T* pixels, std::size_t count, T* results) {
+          pattern.Apply(pixels, count * job.channels, results);
+        });
+        return FilterResult::Success();
+      }
 #endif
+      Balance(job, sharing, GainOffset{gains.data(), offsets.data()});
     }
     return FilterResult::Success();
   });

@@ -43,24 +43,10 @@ template <typename T, class Map>
 void MapBytes(const BalanceJob<T>& job, const BalanceSharing& sharing, const Map& map) {
   std::vector<ByteTable> tables;
   for (std::size_t c = 0; c < job.channels; ++c) tables.push_back(MakeByteTable<T>(map, c));
-  std::vector<RunScratch<T>> scratch;
-  const auto prepare = [&](std::size_t bands) {
-    for (std::size_t b = 0; b < bands; ++b) scratch.emplace_back(job.channels);
-  };
-  ForEachPixelBand(
-      job.Pixels(), sharing, prepare, [&](std::size_t band, std::size_t begin, std::size_t end) {
-        RunScratch<T>& own = scratch[band];
-        const auto plain = [&](const T* pixels, std::size_t count, T* results) {
-          LookUpBytes(reinterpret_cast<const std::uint8_t*>(pixels), count, job.channels,
-                      tables.data(), reinterpret_cast<std::uint8_t*>(results));
-        };
-        ForEachRun(job, begin, end, own, plain, [&](const PixelRun& run) {
-          for (std::size_t c = 0; c < run.channels; ++c) {
-            auto* const bytes = reinterpret_cast<std::uint8_t*>(own.Planes() + c * run.pitch);
-            LookUpBytes(bytes, run.count, 1, &tables[c], bytes);
-          }
-        });
-      });
+  MapBlock(job, sharing, [&](const T* pixels, std::size_t count, T* results) {
+    LookUpBytes(reinterpret_cast<const std::uint8_t*>(pixels), count, job.channels, tables.data(),
+                reinterpret_cast<std::uint8_t*>(results));
+  });
 }
 
 #endif
@@ -72,7 +58,7 @@ void MapSamples(const BalanceJob<T>& job, const BalanceSharing& sharing, const M
 #if ZARN_SIMD
   constexpr std::size_t kPixelsWorthTables = 1024;
   if constexpr (sizeof(T) == 1) {
-    if (HasVectors() && job.Pixels() >= kPixelsWorthTables) {
+    if (RunsAreFast<T>() && job.Pixels() >= kPixelsWorthTables) {
       MapBytes(job, sharing, map);
       return;
     }

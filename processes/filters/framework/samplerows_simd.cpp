@@ -177,14 +177,53 @@ HWY_ATTR void LookUp(const std::uint8_t* pixels, std::size_t count, std::size_t 
 
 template <typename T>
 HWY_ATTR bool AnyNear(const T* samples, std::size_t count, T value) {
-  using Lane = std::conditional_t<std::is_same_v<T, float>, double, T>;
-  const hn::ScalableTag<Lane> d;
+  const hn::ScalableTag<T> d;
   const std::size_t lanes = hn::Lanes(d);
+  const auto wanted = hn::Set(d, value);
   auto any = hn::MaskFromVec(hn::Zero(d));
+  const auto isNear = [&](const T* from) HWY_ATTR {
+    const auto v = hn::LoadU(d, from);
+    if constexpr (std::is_floating_point_v<T>) {
+      // Wide enough for the difference's rounding.
+      return hn::Lt(hn::Abs(hn::Sub(v, wanted)), hn::Set(d, static_cast<T>(2 * kNoDataTolerance)));
+    } else {
+      return hn::Eq(v, wanted);
+    }
+  };
   std::size_t i = 0;
-  for (; i + lanes <= count; i += lanes) any = hn::Or(any, NearlyEqual(d, samples + i, value));
-  const auto rest = hn::And(NearlyEqual(d, samples + i, value), hn::FirstN(d, count - i));
+  for (; i + lanes <= count; i += lanes) {
+    hwy::Prefetch(samples + i + kBytesAhead / sizeof(T));
+    any = hn::Or(any, isNear(samples + i));
+  }
+  const auto rest = hn::And(isNear(samples + i), hn::FirstN(d, count - i));
   return !hn::AllFalse(d, hn::Or(any, rest));
+}
+
+template <typename T>
+HWY_ATTR void Replace(const ExcludedPixels<T>& excluded, std::size_t count, std::size_t channels,
+                      T* pixels) {
+  const ExcludedPixels<T> e = excluded;
+  const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
+    constexpr std::size_t kChannels = constant();
+    using D = hn::ScalableTag<T>;
+    const D d;
+    for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
+      const auto isExcluded = LoadFlags(d, e.flags + i);
+      if (hn::AllFalse(d, isExcluded)) continue;
+      PixelVectors<D, kChannels> v(d, pixels + i * kChannels);
+      if (e.value != nullptr) {
+        v.Replace(isExcluded, e.value);
+      } else {
+        v.Replace(isExcluded, PixelVectors<D, kChannels>(d, e.old + i * kChannels));
+      }
+      v.Store(pixels + i * kChannels);
+    }
+  });
+  if (done) return;
+  for (std::size_t i = 0; i < count * channels; ++i) {
+    if (e.flags[i / channels] == 0) continue;
+    pixels[i] = e.value != nullptr ? e.value[i % channels] : e.old[i];
+  }
 }
 
 HWY_ATTR void StreamAligned(const std::byte* from, std::size_t size, std::byte* to) {
@@ -213,6 +252,10 @@ HWY_ATTR void StreamAligned(const std::byte* from, std::size_t size, std::byte* 
   bool AnyNear##name(const T* samples, std::size_t count, T value) {                              \
     return AnyNear(samples, count, value);                                                        \
   }                                                                                               \
+  void Replace##name(const ExcludedPixels<T>& excluded, std::size_t count, std::size_t channels,  \
+                     T* pixels) {                                                                 \
+    Replace(excluded, count, channels, pixels);                                                   \
+  }                                                                                               \
   void Widen##name(const T* samples, std::size_t count, double* values) {                         \
     Widen(samples, count, values);                                                                \
   }                                                                                               \
@@ -240,6 +283,7 @@ namespace zarn::processes::filters {
   HWY_EXPORT(Join##name);                                                                         \
   HWY_EXPORT(Flag##name);                                                                         \
   HWY_EXPORT(AnyNear##name);                                                                      \
+  HWY_EXPORT(Replace##name);                                                                      \
   HWY_EXPORT(Widen##name);                                                                        \
   HWY_EXPORT(Narrow##name);                                                                       \
   template <>                                                                                     \
@@ -262,6 +306,11 @@ namespace zarn::processes::filters {
   template <>                                                                                     \
   ZARN_HIDDEN bool AnySampleNear(const T* samples, std::size_t count, T value) {                  \
     return HWY_DYNAMIC_DISPATCH(AnyNear##name)(samples, count, value);                            \
+  }                                                                                               \
+  template <>                                                                                     \
+  ZARN_HIDDEN void ReplaceExcluded(const ExcludedPixels<T>& excluded, std::size_t count,          \
+                                   std::size_t channels, T* pixels) {                             \
+    HWY_DYNAMIC_DISPATCH(Replace##name)(excluded, count, channels, pixels);                       \
   }                                                                                               \
   template <>                                                                                     \
   ZARN_HIDDEN void WidenSamples(const T* samples, std::size_t count, double* values) {            \

@@ -38,13 +38,18 @@ template <typename T>
 void JoinChannels(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
                   const ExcludedPixels<T>& excluded, T* pixels);
 
+/// Replaces those of `count` interleaved pixels that are excluded.
+template <typename T>
+void ReplaceExcluded(const ExcludedPixels<T>& excluded, std::size_t count, std::size_t channels,
+                     T* pixels);
+
 /// Flags the pixels whose mask byte is 0 or whose channels all equal `noData` (as
 /// `PixelNearlyEquals` has it) and tells whether there are any. Either pointer may be null.
 template <typename T>
 bool FlagExcluded(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
                   const T* noData, const std::uint8_t* mask, std::uint8_t* flags);
 
-/// Whether any of the samples nearly equals `value`.
+/// Whether any of the samples may nearly equal `value`: false is certain, true is not.
 template <typename T>
 bool AnySampleNear(const T* samples, std::size_t count, T value);
 

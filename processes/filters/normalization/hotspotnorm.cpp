@@ -2,6 +2,7 @@
 #include "processes/filters/normalization/hotspotnorm.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 
 #include "host/sys/vectorised.h"
@@ -16,25 +17,31 @@ double Surface(const double* p, double x, double y) {
   return (y * p[1] + p[3] + x * p[0]) * x + y * p[2] * y + y * p[4] + p[5];
 }
 
-/// A channel's part of a run.
+/// Columns of the image, divided by its extent.
 ZARN_VECTORISED
-void BalanceRun(double* values, std::size_t count, std::uint32_t column, double columns, double y,
-                const double* coefficients) {
-  double p[kCoefficients];
-  std::copy_n(coefficients, kCoefficients, p);
+void PlaceColumns(std::uint32_t column, std::size_t count, double columns, double* x) {
   for (std::size_t i = 0; i < count; ++i) {
-    const double x = static_cast<double>(column + static_cast<std::uint32_t>(i)) / columns;
-    values[i] = values[i] - Surface(p, x, y);
+    x[i] = static_cast<double>(column + static_cast<std::uint32_t>(i)) / columns;
   }
 }
 
+/// A channel's part of a run.
+ZARN_VECTORISED
+void BalanceRun(double* values, std::size_t count, const double* x, double y,
+                const double* coefficients) {
+  double p[kCoefficients];
+  std::copy_n(coefficients, kCoefficients, p);
+  for (std::size_t i = 0; i < count; ++i) values[i] = values[i] - Surface(p, x[i], y);
+}
+
 struct HotSpots {
-  void Run(const PixelRun& run) const {
+  void Run(const PixelRun& run) {
     const auto column = x0 + static_cast<std::uint32_t>(run.column);
     const auto row = y0 + static_cast<std::uint32_t>(run.row);
+    PlaceColumns(column, run.count, columns, x.data());
     const double y = static_cast<double>(row) / rows;
     for (std::size_t c = 0; c < run.channels; ++c) {
-      BalanceRun(run.Channel(c), run.count, column, columns, y, coefficients[c].data());
+      BalanceRun(run.Channel(c), run.count, x.data(), y, coefficients[c].data());
     }
   }
 
@@ -43,6 +50,7 @@ struct HotSpots {
   double rows;
   std::uint32_t x0;
   std::uint32_t y0;
+  std::array<double, kRunPixels> x{};  ///< of the run, for all channels
 };
 
 // Channels until the first one whose coefficients are not complete.
@@ -67,8 +75,12 @@ FilterResult CPUHotSpotNorm::Process(const gobs::Raster& input, gobs::Raster& ou
     }
     const BalanceJob<T> job(input, output, inputNoData, outputNoData, inputMask,
                             MakeConverters<T>(bounds, outputNoData));
-    const HotSpots correction{coefficients.data(), static_cast<double>(columnDivisor),
-                              static_cast<double>(rowDivisor), blockX, blockY};
+    const HotSpots correction{coefficients.data(),
+                              static_cast<double>(columnDivisor),
+                              static_cast<double>(rowDivisor),
+                              blockX,
+                              blockY,
+                              {}};
     Balance(job, ShareAlways(input), correction);
     return FilterResult::Success();
   });

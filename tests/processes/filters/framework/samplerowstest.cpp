@@ -70,12 +70,17 @@ class SampleRows : public ::testing::TestWithParam<std::int64_t> {
     for (const ExcludedPixels<T>& excluded : {ExcludedPixels<T>{},
                                               {flags.data(), value.data(), nullptr},
                                               {flags.data(), nullptr, old.data()}}) {
+      std::vector<T> replaced = pixels;
+      if (excluded.flags != nullptr) {
+        ReplaceExcluded(excluded, count, channels, replaced.data());
+      }
       std::vector<T> joined(kPitch * channels);
       JoinChannels(planes.data(), kPitch, count, channels, excluded, joined.data());
       for (std::size_t i = 0; i < count * channels; ++i) {
-        const bool replaced = excluded.flags != nullptr && flags[i / channels] != 0;
+        const bool isExcluded = excluded.flags != nullptr && flags[i / channels] != 0;
         const T other = excluded.value != nullptr ? value[i % channels] : old[i];
-        ASSERT_EQ(joined[i], replaced ? other : pixels[i]) << count;
+        ASSERT_EQ(joined[i], isExcluded ? other : pixels[i]) << count;
+        ASSERT_EQ(replaced[i], isExcluded ? other : pixels[i]) << count;
       }
     }
   }
@@ -112,7 +117,10 @@ class SampleRows : public ::testing::TestWithParam<std::int64_t> {
         }
         ASSERT_EQ(any, expectedAny) << count;
         if (masked || channels > 1) continue;
-        ASSERT_EQ(AnySampleNear(planes.data(), count, T{0}), expectedAny) << count;
+        // It may find some that are only near, but never misses one.
+        const bool near = AnySampleNear(planes.data(), count, T{0});
+        ASSERT_TRUE(near || !expectedAny) << count;
+        ASSERT_FALSE(near && rare && !std::is_floating_point_v<T>) << count;
       }
     }
   }
