@@ -75,11 +75,11 @@ struct Factory1Template {
 ///
 /// Usage: `ExtendDispatchTypes<Factory1Template<Proc, IProc>, 1, AllSampleTypes, AllSampleTypes,
 /// NullDataType>::Dispatch(types, allowComplex)`.
-template <typename Factory, unsigned Consumed, typename FullList, typename RemainingList,
+template <typename Factory, unsigned kConsumed, typename FullList, typename RemainingList,
           typename End>
 class ExtendDispatchTypes {
  public:
-  static_assert(Consumed == 1, "processors have one sample type");
+  static_assert(kConsumed == 1, "processors have one sample type");
   using Interface = typename Factory::Interface;
 
   /// A new processor for the type that `types[0]` describes; the caller deletes it through the
@@ -100,8 +100,8 @@ class ExtendDispatchTypes {
     if constexpr (std::is_same_v<Tail, End>) {
       throw Exception("Invalid type requested.", kSource, __PRETTY_FUNCTION__, __LINE__);
     } else {
-      return ExtendDispatchTypes<Factory, Consumed, FullList, Tail, End>::Dispatch(types,
-                                                                                   allowComplex);
+      return ExtendDispatchTypes<Factory, kConsumed, FullList, Tail, End>::Dispatch(types,
+                                                                                    allowComplex);
     }
   }
 };
