@@ -41,6 +41,10 @@ class BalanceScene {
     }
     if (inputNoData.size() < channels) inputNoData.clear();
     if (outputNoData.size() < channels) outputNoData.clear();
+    // Entries that no channel has do not count.
+    for (std::vector<double>* const list : {&inputNoData, &outputNoData}) {
+      if (!list->empty() && random_.Percent(40)) list->insert(list->end(), {3.0, 99.0});
+    }
     for (std::size_t i = 0; i < input_.SampleCount(); ++i) {
       input_.Samples()[i] = static_cast<T>(random_.Below(120));
       if (random_.Percent(3)) input_.Samples()[i] = Special();

@@ -3,7 +3,6 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <optional>
 #include <utility>
 #include <vector>
 
@@ -30,23 +29,23 @@ inline blockchecks::Refusal CheckBalanced(const gobs::Raster& input, const gobs:
   if (input.Width() != output.Width() || input.Height() != output.Height()) {
     return FilterResult::Failure(messages::kSizesDiffer);
   }
-  if (auto refusal = blockchecks::CheckBlocks(input, output, inputNoData, outputNoData,
-                                              blockchecks::Aliasing::kSameBlockAllowed)) {
-    return refusal;
-  }
-  if (parameters < input.Channels()) return FilterResult::Failure(messages::kFewParameters);
-  return std::nullopt;
+  return blockchecks::CheckBlocks(input, output, inputNoData, outputNoData,
+                                  blockchecks::Aliasing::kSameBlockAllowed, parameters);
 }
 
 /// Shares out blocks of more than `serialUpTo` pixels.
 inline BalanceSharing ShareAbove(std::int64_t serialUpTo, const gobs::RasterInfo& block) {
   const std::int64_t pixels = std::int64_t{block.Width()} * block.Height();
-  return {pixels > serialUpTo && parallel::MayShareOut(), pixels};
+  return {.parallel = pixels > serialUpTo && parallel::MayShareOut()};
+}
+
+/// Shares out the rows of blocks of two and more that have more than `serialUpTo` pixels.
+inline BalanceSharing ShareRowsAbove(std::int64_t serialUpTo, const gobs::RasterInfo& block) {
+  const bool parallel = ShareAbove(serialUpTo, block).parallel && block.Height() >= 2;
+  return {.parallel = parallel, .wholeRows = true};
 }
 
 /// Shares out every block.
-inline BalanceSharing ShareAlways(const gobs::RasterInfo& block) {
-  return {true, std::int64_t{block.Width()} * block.Height()};
-}
+inline BalanceSharing ShareAlways() { return {.parallel = true}; }
 
 }  // namespace zarn::processes::filters

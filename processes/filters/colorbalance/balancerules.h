@@ -32,7 +32,7 @@ class BalanceRules {
 
   /// Writes what an excluded pixel becomes: the output no-data pixel, or what the output holds.
   void WriteExcluded(T* output) const {
-    std::copy(outputNoData_.begin(), outputNoData_.end(), output);
+    if (!outputNoData_.empty()) std::copy_n(outputNoData_.begin(), channels_, output);
   }
 
   /// Null where there is none.

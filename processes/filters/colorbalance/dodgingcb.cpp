@@ -109,19 +109,12 @@ class Dodging {
 
   void Run(const PixelRun& run) {
     if (run.excluded == nullptr) return Balance(run, 0, run.count);
-    for (std::size_t i = 0; i < run.count;) {
-      const auto* const end = run.excluded + run.count;
-      const auto* const first = std::find(run.excluded + i, end, 0);
-      const auto* const last =
-          std::find_if(first, end, [](std::uint8_t flag) { return flag != 0; });
-      i = static_cast<std::size_t>(last - run.excluded);
-      Balance(run, static_cast<std::size_t>(first - run.excluded), i);
-    }
+    ForEachIncluded(run.excluded, run.count,
+                    [&](std::size_t begin, std::size_t end) { Balance(run, begin, end); });
   }
 
  private:
   void Balance(const PixelRun& run, std::size_t begin, std::size_t end) {
-    if (begin == end) return;
     const auto column = x0_ + static_cast<std::uint32_t>(run.column + begin);
     const auto row = y0_ + static_cast<std::uint32_t>(run.row);
     gains_.Sample(column, row, end - begin);
@@ -168,7 +161,7 @@ class CPUDodgingProc : public IDodgingProc {
     if (!Covers(gain, input) || !Covers(offset, input)) {
       return FilterResult::Failure(messages::kFewParameters);
     }
-    Balance(job, ShareAlways(input), Dodging(coeffs, type, gain.Get(), offset.Get(), input));
+    Balance(job, ShareAlways(), Dodging(coeffs, type, gain.Get(), offset.Get(), input));
     return FilterResult::Success();
   }
 };

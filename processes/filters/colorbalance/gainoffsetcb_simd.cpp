@@ -3,6 +3,7 @@
 
 #include <hwy/cache_control.h>
 
+#include <algorithm>
 #include <cstdint>
 
 #include "processes/filters/framework/converterconstants.h"
@@ -34,21 +35,44 @@ HWY_ATTR void ApplyPattern(const GainOffsetPattern<T>& pattern, const T* samples
   const std::size_t step = lanes % channels;
   const double* const gain = pattern.gain.data();
   const double* const offset = pattern.offset.data();
-  const double* const low = pattern.low.data();
-  const double* const high = pattern.high.data();
-  const double* const noData = pattern.noData.data();
-  const double* const replacement = pattern.replacement.data();
-  const bool avoids = pattern.avoids;
-  std::size_t phase = 0;  // the channel of the vector's first sample
-  for (std::size_t i = 0; i < count; i += lanes) {
-    hwy::Prefetch(samples + i + kBytesAhead / sizeof(T));
-    const auto load = [&](const double* from) HWY_ATTR { return hn::LoadU(d, from + phase); };
-    const ConverterVectors<T, D> convert(d, load(low), load(high), load(noData), load(replacement),
-                                         avoids);
-    const auto v = LoadDoubles(d, samples + i);
-    convert.Store(hn::Add(hn::Mul(v, load(gain)), load(offset)), results + i);
-    phase += step;
-    if (phase >= channels) phase -= channels;
+  const auto converters = [&](std::size_t phase) HWY_ATTR {
+    const auto load = [&](const std::vector<double>& row)
+                          HWY_ATTR { return hn::LoadU(d, row.data() + phase); };
+    return ConverterVectors<T, D>(d, load(pattern.low), load(pattern.high), load(pattern.noData),
+                                  load(pattern.replacement), pattern.avoids);
+  };
+  std::size_t phase = 0;  // the channel of a vector's first sample
+  const auto applyAll = [&](const auto& convert) HWY_ATTR {
+    const auto apply = [&](const T* from, T* to) HWY_ATTR {
+      const auto v = hn::Mul(LoadDoubles(d, from), hn::LoadU(d, gain + phase));
+      convert().Store(hn::Add(v, hn::LoadU(d, offset + phase)), to);
+    };
+    constexpr std::size_t kLine = 64 / sizeof(T);
+    std::size_t i = 0;
+    for (; i + kLine <= count; i += kLine) {
+      hwy::Prefetch(samples + i + kBytesAhead / sizeof(T));
+      for (std::size_t k = 0; k < kLine; k += lanes) {
+        apply(samples + i + k, results + i + k);
+        phase += step;
+        if (phase >= channels) phase -= channels;
+      }
+    }
+    for (; i < count; i += lanes) {
+      // Nothing past the samples is touched.
+      const std::size_t rest = std::min(count - i, lanes);
+      HWY_ALIGN T buffer[hn::MaxLanes(d)] = {};
+      std::copy_n(samples + i, rest, buffer);
+      apply(buffer, buffer);
+      std::copy_n(buffer, rest, results + i);
+      phase += step;
+      if (phase >= channels) phase -= channels;
+    }
+  };
+  if (pattern.oneConverter) {
+    const ConverterVectors<T, D> all = converters(0);
+    applyAll([&]() HWY_ATTR -> const ConverterVectors<T, D>& { return all; });
+  } else {
+    applyAll([&]() HWY_ATTR { return converters(phase); });
   }
 }
 
@@ -85,6 +109,7 @@ GainOffsetPattern<T>::GainOffsetPattern(const double* gains, const double* offse
     noData.push_back(constants.noData);
     replacement.push_back(constants.replacement);
     avoids = avoids || constants.avoids;
+    oneConverter = oneConverter && constants == ConverterConstants<T>(converters.front());
   }
 }
 

@@ -17,7 +17,7 @@ class GainOffsetPattern {
                     const std::vector<OutputConverter<T>>& converters);
 
   /// `sample * gain + offset`, converted, for `count` samples from the first one of a pixel on: the
-  /// same bits as one by one. May read and write one vector past the end.
+  /// same bits as one by one. The results may take the place of the samples.
   void Apply(const T* samples, std::size_t count, T* results) const;
 
   // One double for each sample, from any channel on for at least a vector.
@@ -29,6 +29,7 @@ class GainOffsetPattern {
   std::vector<double> replacement;
   std::size_t channels;
   bool avoids = false;
+  bool oneConverter = true;  ///< all channels have the same
 };
 
 }  // namespace zarn::processes::filters

@@ -22,11 +22,13 @@ enum class ColorBalanceKind : std::int32_t {
 /// |---|---|
 /// | sample types | integers up to 32 bits, float, double; others where a class says so |
 /// | blocks | same size, type and channels; no margins; the output may be the input |
-/// | masked pixel (mask byte 0) | becomes the output no-data pixel, or stays unwritten without one
-/// | | input no-data pixel (all channels equal; floating ones within 2.2e-16) | likewise | | any
-/// other pixel | never equals a channel's output no-data value, unless a class says so | | failures
-/// | "Unknown raster block data type for color balancing", inconsistent blocks, fewer
-///   parameters than channels; the output stays untouched |
+/// | excluded pixel | becomes the output no-data pixel, or stays unwritten without one |
+/// | any other pixel | never equals a channel's output no-data value, unless a class says so |
+/// | unknown type | "Unknown raster block data type for color balancing" |
+///
+/// Excluded are pixels whose mask byte is 0 and those whose channels all equal the input no-data
+/// values (floating ones within 2.2e-16). Inconsistent blocks and fewer parameters than channels
+/// are refused too. After a failure the output is untouched.
 class IColorBalance : public IFilter {
  public:
   virtual ColorBalanceKind Kind() const = 0;

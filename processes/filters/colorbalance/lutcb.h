@@ -21,8 +21,7 @@ inline constexpr std::int64_t kLUTSerialUpTo = 2000;
 
 /// A table of 256 bytes per channel, indexed by the sample held within 0 .. 255 (floating samples
 /// are truncated; NaN takes entry 0). The entry is written as it is, so it may equal the output
-/// no-data value. Signed bytes above 127 come
-/// out as negative samples.
+/// no-data value. Signed bytes above 127 come out as negative samples.
 class LUTCBBase : public IColorBalance {
  public:
   explicit LUTCBBase(std::vector<LookUpTable> tables);

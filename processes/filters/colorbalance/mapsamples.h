@@ -65,7 +65,7 @@ void MapSamples(const BalanceJob<T>& job, const BalanceSharing& sharing, const M
   }
 #endif
   ForEachPixelBand(
-      job.Pixels(), sharing, [](std::size_t) {},
+      job, sharing, [](std::size_t) {},
       [&](std::size_t, std::size_t begin, std::size_t end) { MapPixels(job, begin, end, map); });
 }
 

@@ -19,24 +19,30 @@ double Balanced7(double v, const double* a, double x, double y) {
   return a[0] + ((a[4] * y + a[2] + a[6] * x) * y + (a[5] * x + a[3]) * x + a[1]) * v;
 }
 
+/// The block's columns in the image.
+std::vector<double> Columns(std::uint32_t first, std::size_t count) {
+  std::vector<double> x(count);
+  for (std::size_t i = 0; i < count; ++i) {
+    x[i] = static_cast<double>(first + static_cast<std::uint32_t>(i));
+  }
+  return x;
+}
+
 /// A channel's part of a run.
 ZARN_VECTORISED
-void BalanceRun(double* values, std::size_t count, std::uint32_t column, double y,
+void BalanceRun(double* values, std::size_t count, const double* x, double y,
                 const double* coefficients, std::size_t n, double bias) {
   double a[7] = {};
   if (n <= 7) std::copy_n(coefficients, n, a);
-  const auto x = [column](std::size_t i) {
-    return static_cast<double>(column + static_cast<std::uint32_t>(i));
-  };
   switch (n) {
     case 2:
       for (std::size_t i = 0; i < count; ++i) values[i] = Balanced2(values[i] + bias, a);
       break;
     case 4:
-      for (std::size_t i = 0; i < count; ++i) values[i] = Balanced4(values[i] + bias, a, x(i), y);
+      for (std::size_t i = 0; i < count; ++i) values[i] = Balanced4(values[i] + bias, a, x[i], y);
       break;
     case 7:
-      for (std::size_t i = 0; i < count; ++i) values[i] = Balanced7(values[i] + bias, a, x(i), y);
+      for (std::size_t i = 0; i < count; ++i) values[i] = Balanced7(values[i] + bias, a, x[i], y);
       break;
     default:
       for (std::size_t i = 0; i < count; ++i) values[i] += bias;
@@ -45,17 +51,16 @@ void BalanceRun(double* values, std::size_t count, std::uint32_t column, double 
 
 struct Polynomials {
   void Run(const PixelRun& run) const {
-    const auto column = x0 + static_cast<std::uint32_t>(run.column);
     const auto y = static_cast<double>(y0 + static_cast<std::uint32_t>(run.row));
     for (std::size_t c = 0; c < run.channels; ++c) {
-      BalanceRun(run.Channel(c), run.count, column, y, rows[c], n, biases[c]);
+      BalanceRun(run.Channel(c), run.count, x + run.column, y, rows[c], n, biases[c]);
     }
   }
 
   const double* const* rows;
   std::size_t n;
   const double* biases;
-  std::uint32_t x0;
+  const double* x;  ///< of each column of the block
   std::uint32_t y0;
 };
 
@@ -71,9 +76,9 @@ class CPUNeighProc : public INeighProc {
   FilterResult Process(const gobs::Raster& input, gobs::Raster& output, std::uint32_t x0,
                        std::uint32_t y0, const std::uint8_t* inputMask) override {
     const BalanceJob<T> job(input, output, inputNoData_, outputNoData_, inputMask, converters_);
-    const BalanceSharing sharing{ShareAbove(kSerialUpTo, input).parallel && input.Height() >= 2,
-                                 input.Height()};
-    Balance(job, sharing, Polynomials{rows_.data(), n_, biases_, x0, y0});
+    const std::vector<double> x = Columns(x0, input.Width());
+    Balance(job, ShareRowsAbove(kSerialUpTo, input),
+            Polynomials{rows_.data(), n_, biases_, x.data(), y0});
     return FilterResult::Success();
   }
 

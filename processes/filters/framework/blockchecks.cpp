@@ -37,13 +37,14 @@ Refusal CheckMargins(const gobs::RasterInfo& input, std::int64_t half) {
 
 Refusal CheckBlocks(const gobs::Raster& input, const gobs::Raster& output,
                     const std::vector<double>& inputNoData, const std::vector<double>& outputNoData,
-                    Aliasing aliasing) {
+                    Aliasing aliasing, std::size_t parameterChannels) {
   if (input.Type() != output.Type() || input.Channels() != output.Channels()) {
     return FilterResult::Failure(messages::kTypesDiffer);
   }
   if (TooShort(inputNoData, input) || TooShort(outputNoData, input)) {
     return FilterResult::Failure(messages::kFewNoDataValues);
   }
+  if (parameterChannels < input.Channels()) return FilterResult::Failure(messages::kFewParameters);
   if (Inconsistent(input) || Inconsistent(output)) {
     return FilterResult::Failure(messages::kInconsistentBlock);
   }

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <optional>
 #include <vector>
 
@@ -25,12 +27,16 @@ Refusal CheckMargins(const gobs::RasterInfo& input, std::int64_t half);
 /// Whether a filter may write into its own input.
 enum class Aliasing { kForbidden, kSameBlockAllowed };
 
+/// For filters without parameters per channel.
+inline constexpr std::size_t kNoParameters = std::numeric_limits<std::size_t>::max();
+
 /// What every family refuses after its own checks, because processing would read or write out of
-/// bounds: another type or channel count, short no-data lists (empty lists are fine), blocks
-/// without data or smaller than described, and overlapping memory; in this order.
+/// bounds: another type or channel count, short no-data lists (empty lists are fine), parameters
+/// for fewer channels, blocks without data or smaller than described, and overlapping memory; in
+/// this order.
 Refusal CheckBlocks(const gobs::Raster& input, const gobs::Raster& output,
                     const std::vector<double>& inputNoData, const std::vector<double>& outputNoData,
-                    Aliasing aliasing);
+                    Aliasing aliasing, std::size_t parameterChannels = kNoParameters);
 
 }  // namespace blockchecks
 }  // namespace zarn::processes::filters

@@ -70,18 +70,6 @@ HWY_INLINE hn::Vec<D> LoadDoubles(D d, const T* from) {
   }
 }
 
-/// Which samples equal a value, floating ones within a tolerance; lanes of double for floating
-/// samples, else of their type.
-template <class D, typename T>
-HWY_INLINE hn::Mask<D> NearlyEqual(D d, const T* from, T value) {
-  if constexpr (std::is_floating_point_v<T>) {
-    const auto difference = hn::Sub(LoadDoubles(d, from), hn::Set(d, static_cast<double>(value)));
-    return hn::Lt(hn::Abs(difference), hn::Set(d, kNoDataTolerance));
-  } else {
-    return hn::Eq(hn::LoadU(d, from), hn::Set(d, value));
-  }
-}
-
 /// A vector of pixels of one to four channels, one vector for each channel.
 template <class D, std::size_t kChannels>
 struct PixelVectors {
@@ -109,6 +97,22 @@ struct PixelVectors {
       equal = hn::And(equal, hn::Eq(channel[c], hn::Set(d, value[c])));
     }
     return equal;
+  }
+
+  /// The same, floating samples within the tolerance of no-data values, compared in their type.
+  template <typename T>
+  HWY_INLINE hn::Mask<D> NearlyEqual(const T* value) const {
+    if constexpr (std::is_floating_point_v<T>) {
+      const auto tolerance = hn::Set(d, static_cast<T>(kNoDataTolerance));
+      const auto isNear = [&](std::size_t c) HWY_ATTR {
+        return hn::Lt(hn::Abs(hn::Sub(channel[c], hn::Set(d, value[c]))), tolerance);
+      };
+      auto nearly = isNear(0);
+      for (std::size_t c = 1; c < kChannels; ++c) nearly = hn::And(nearly, isNear(c));
+      return nearly;
+    } else {
+      return Equal(value);
+    }
   }
 
   /// Replaces the chosen pixels by `value`, or by those of another vector.

@@ -4,8 +4,8 @@
 #include <hwy/cache_control.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdint>
-#include <cstring>
 #include <limits>
 #include <type_traits>
 
@@ -29,105 +29,153 @@ namespace zarn::processes::filters::HWY_NAMESPACE {
 
 bool Vectors() { return HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128; }
 
+/// A vector's pixels in memory: what is left of a run is copied here, so that nothing past it is
+/// touched.
+template <class D, std::size_t kChannels>
+struct PixelBuffer {
+  using T = hn::TFromD<D>;
+
+  HWY_INLINE T* Fill(const T* pixels, std::size_t count) {
+    std::copy_n(pixels, count * kChannels, samples);
+    return samples;
+  }
+
+  HWY_ALIGN T samples[kChannels * hn::MaxLanes(D())] = {};
+};
+
 template <typename T>
-HWY_ATTR void Split(const T* pixels, std::size_t count, std::size_t channels, T* planes,
+HWY_ATTR void Widen(const T* pixels, std::size_t count, std::size_t channels, double* values,
                     std::size_t pitch) {
+  using D = hn::ScalableTag<T>;
+  const D d;
+  const hn::ScalableTag<double> wide;
   const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
     constexpr std::size_t kChannels = constant();
-    const hn::ScalableTag<T> d;
+    PixelBuffer<D, kChannels> buffer;
     for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-      const PixelVectors<hn::ScalableTag<T>, kChannels> v(d, pixels + i * kChannels);
+      const T* from = pixels + i * kChannels;
       for (std::size_t c = 0; c < kChannels; ++c) {
-        hn::StoreU(v.channel[c], d, planes + c * pitch + i);
+        hwy::Prefetch(from + c * hn::Lanes(d) + kBytesAhead / sizeof(T));
+      }
+      if (i + hn::Lanes(d) > count) from = buffer.Fill(from, count - i);
+      const PixelVectors<D, kChannels> v(d, from);
+      for (std::size_t c = 0; c < kChannels; ++c) {
+        HWY_ALIGN T row[hn::MaxLanes(d)];
+        hn::Store(v.channel[c], d, row);
+        for (std::size_t k = 0; k < hn::Lanes(d); k += hn::Lanes(wide)) {
+          hn::StoreU(LoadDoubles(wide, row + k), wide, values + c * pitch + i + k);
+        }
       }
     }
   });
   if (done) return;
   for (std::size_t c = 0; c < channels; ++c) {
-    for (std::size_t i = 0; i < count; ++i) planes[c * pitch + i] = pixels[i * channels + c];
+    for (std::size_t i = 0; i < count; ++i) {
+      values[c * pitch + i] = static_cast<double>(pixels[i * channels + c]);
+    }
   }
 }
 
 template <typename T>
-HWY_ATTR void Join(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
-                   const ExcludedPixels<T>& excluded, T* pixels) {
-  const ExcludedPixels<T> e = excluded;
+HWY_ATTR void Narrow(const double* values, std::size_t pitch, std::size_t count,
+                     std::size_t channels, const ConverterConstants<T>* converters, T* pixels) {
+  using D = hn::ScalableTag<T>;
+  using Wide = hn::ScalableTag<double>;
+  const D d;
+  const Wide wide;
+  // Long enough that its first samples have left the store buffer when they are read again.
+  constexpr std::size_t kRow = 256;
+  const auto narrow = [&](std::size_t begin, std::size_t end, std::size_t c, T* row) HWY_ATTR {
+    const ConverterVectors<T, Wide> convert(wide, converters[c]);
+    for (std::size_t i = begin; i < end; i += hn::Lanes(wide)) {
+      convert.Store(hn::LoadU(wide, values + c * pitch + i), row + (i - begin));
+    }
+  };
   const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
     constexpr std::size_t kChannels = constant();
-    const hn::ScalableTag<T> d;
-    for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-      PixelVectors<hn::ScalableTag<T>, kChannels> v(d);
-      for (std::size_t c = 0; c < kChannels; ++c) {
-        v.channel[c] = hn::LoadU(d, planes + c * pitch + i);
-      }
-      if (e.flags != nullptr) {
-        const auto isExcluded = LoadFlags(d, e.flags + i);
-        if (e.value != nullptr) {
-          v.Replace(isExcluded, e.value);
+    HWY_ALIGN T rows[kChannels][kRow];
+    for (std::size_t begin = 0; begin < count; begin += kRow) {
+      const std::size_t end = std::min(count, begin + kRow);
+      for (std::size_t c = 0; c < kChannels; ++c) narrow(begin, end, c, rows[c]);
+      for (std::size_t i = begin; i < end; i += hn::Lanes(d)) {
+        PixelVectors<D, kChannels> v(d);
+        for (std::size_t c = 0; c < kChannels; ++c) {
+          v.channel[c] = hn::Load(d, rows[c] + (i - begin));
+        }
+        if (i + hn::Lanes(d) <= end) {
+          v.Store(pixels + i * kChannels);
         } else {
-          v.Replace(isExcluded,
-                    PixelVectors<hn::ScalableTag<T>, kChannels>(d, e.old + i * kChannels));
+          PixelBuffer<D, kChannels> buffer;
+          v.Store(buffer.samples);
+          std::copy_n(buffer.samples, (end - i) * kChannels, pixels + i * kChannels);
         }
       }
-      v.Store(pixels + i * kChannels);
     }
   });
   if (done) return;
-  for (std::size_t i = 0; i < count; ++i) {
-    const bool isExcluded = e.flags != nullptr && e.flags[i] != 0;
+  HWY_ALIGN T row[kRow];
+  for (std::size_t begin = 0; begin < count; begin += kRow) {
+    const std::size_t end = std::min(count, begin + kRow);
     for (std::size_t c = 0; c < channels; ++c) {
-      const std::size_t at = i * channels + c;
-      pixels[at] = !isExcluded          ? planes[c * pitch + i]
-                   : e.value != nullptr ? e.value[c]
-                                        : e.old[at];
+      narrow(begin, end, c, row);
+      for (std::size_t i = begin; i < end; ++i) pixels[i * channels + c] = row[i - begin];
     }
   }
 }
 
+/// Whether `PixelNearlyEquals` may compare in the sample's own type: the difference of a float to
+/// this value is then exact, or clearly above the tolerance.
 template <typename T>
-HWY_ATTR bool Flag(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
-                   const T* noData, const std::uint8_t* mask, std::uint8_t* flags) {
-  // Only floats have to be compared in double.
-  using Lane = std::conditional_t<std::is_same_v<T, float>, double, T>;
-  const hn::ScalableTag<Lane> d;
-  const hn::Rebind<std::uint8_t, decltype(d)> d8;
-  auto any = hn::Zero(d8);
-  const auto flag = [&](std::size_t i) HWY_ATTR {
-    auto excluded = hn::MaskFromVec(hn::Zero(d));
-    if (noData != nullptr) {
-      excluded = NearlyEqual(d, planes + i, noData[0]);
-      for (std::size_t c = 1; c < channels; ++c) {
-        excluded = hn::And(excluded, NearlyEqual(d, planes + c * pitch + i, noData[c]));
+bool ComparesInOwnType(T noData) {
+  return !std::is_same_v<T, float> || noData == 0 ||
+         !(std::abs(static_cast<double>(noData)) < 0x1p-28);
+}
+
+template <typename T>
+HWY_ATTR bool Flag(const T* pixels, std::size_t count, std::size_t channels, const T* noData,
+                   const std::uint8_t* mask, std::uint8_t* flags) {
+  using D = hn::ScalableTag<T>;
+  const D d;
+  const hn::Rebind<std::uint8_t, D> d8;
+  bool any = false;
+  const auto usePixelVectors = [&](auto constant) HWY_ATTR {
+    constexpr std::size_t kChannels = constant();
+    auto found = hn::Zero(d8);
+    const auto flag = [&](const T* from, const std::uint8_t* maskFrom, std::size_t i) HWY_ATTR {
+      auto excluded = hn::MaskFromVec(hn::Zero(d));
+      if (noData != nullptr) {
+        excluded = PixelVectors<D, kChannels>(d, from).NearlyEqual(noData);
       }
+      if (mask != nullptr) excluded = hn::Or(excluded, hn::Not(LoadFlags(d, maskFrom)));
+      StoreFlags(d, excluded, flags + i);
+      return hn::LoadU(d8, flags + i);
+    };
+    std::size_t i = 0;
+    for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) {
+      found = hn::Or(found, flag(pixels + i * kChannels, mask + i, i));
     }
-    if (mask != nullptr) excluded = hn::Or(excluded, hn::Not(LoadFlags(d, mask + i)));
-    StoreFlags(d, excluded, flags + i);
-    return hn::LoadU(d8, flags + i);
+    if (i < count) {
+      PixelBuffer<D, kChannels> buffer;
+      PixelBuffer<decltype(d8), 1> maskBuffer;
+      const std::uint8_t* const maskRest =
+          mask == nullptr ? nullptr : maskBuffer.Fill(mask + i, count - i);
+      const auto rest = flag(buffer.Fill(pixels + i * kChannels, count - i), maskRest, i);
+      // What lies beyond the row does not count.
+      found = hn::Or(found, hn::IfThenElseZero(hn::FirstN(d8, count - i), rest));
+    }
+    any = !hn::AllTrue(d8, hn::Eq(found, hn::Zero(d8)));
   };
-  std::size_t i = 0;
-  for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) any = hn::Or(any, flag(i));
-  // What lies beyond the row does not count.
-  if (i < count) any = hn::Or(any, hn::IfThenElseZero(hn::FirstN(d8, count - i), flag(i)));
-  return !hn::AllTrue(d8, hn::Eq(any, hn::Zero(d8)));
-}
-
-template <typename T>
-HWY_ATTR void Widen(const T* samples, std::size_t count, double* values) {
-  const hn::ScalableTag<double> d;
-  for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-    hn::StoreU(LoadDoubles(d, samples + i), d, values + i);
+  const bool plain =
+      noData == nullptr || std::all_of(noData, noData + channels, ComparesInOwnType<T>);
+  if (plain && WithPixelVectors(channels, usePixelVectors)) return any;
+  for (std::size_t i = 0; i < count; ++i) {
+    const bool excluded =
+        (mask != nullptr && mask[i] == 0) ||
+        (noData != nullptr && PixelNearlyEquals(pixels + i * channels, noData, channels));
+    flags[i] = excluded ? 1 : 0;
+    any = any || excluded;
   }
-}
-
-template <typename T>
-HWY_ATTR void Narrow(const double* values, std::size_t count, const OutputConverter<T>& converter,
-                     T* samples) {
-  const hn::ScalableTag<double> d;
-  const ConverterConstants<T> constants(converter);
-  const ConverterVectors<T, decltype(d)> convert(d, constants);
-  for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-    convert.Store(hn::LoadU(d, values + i), samples + i);
-  }
+  return any;
 }
 
 #if HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128
@@ -159,16 +207,24 @@ HWY_ATTR void LookUp(const std::uint8_t* pixels, std::size_t count, std::size_t 
     constexpr std::size_t kChannels = constant();
     using D = hn::ScalableTag<std::uint8_t>;
     const D d;
-    for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-      for (std::size_t c = 0; c < kChannels; ++c) {
-        hwy::Prefetch(pixels + i * kChannels + kBytesAhead + c * hn::Lanes(d));
-      }
-      PixelVectors<D, kChannels> v(d, pixels + i * kChannels);
+    const auto lookUp = [&](const std::uint8_t* from, std::uint8_t* to) HWY_ATTR {
+      PixelVectors<D, kChannels> v(d, from);
       for (std::size_t c = 0; c < kChannels; ++c) {
         v.channel[c] = LookUpVector(d, v.channel[c], tables[c].data());
       }
-      v.Store(results + i * kChannels);
+      v.Store(to);
+    };
+    std::size_t i = 0;
+    for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) {
+      for (std::size_t c = 0; c < kChannels; ++c) {
+        hwy::Prefetch(pixels + i * kChannels + kBytesAhead + c * hn::Lanes(d));
+      }
+      lookUp(pixels + i * kChannels, results + i * kChannels);
     }
+    if (i == count) return;
+    PixelBuffer<D, kChannels> buffer;
+    lookUp(buffer.Fill(pixels + i * kChannels, count - i), buffer.samples);
+    std::copy_n(buffer.samples, (count - i) * kChannels, results + i * kChannels);
   });
   if (done) return;
 #endif
@@ -191,77 +247,62 @@ HWY_ATTR bool AnyNear(const T* samples, std::size_t count, T value) {
     }
   };
   std::size_t i = 0;
-  for (; i + lanes <= count; i += lanes) {
-    hwy::Prefetch(samples + i + kBytesAhead / sizeof(T));
-    any = hn::Or(any, isNear(samples + i));
+  for (; i + lanes <= count; i += lanes) any = hn::Or(any, isNear(samples + i));
+  if (i < count) {
+    PixelBuffer<decltype(d), 1> buffer;
+    const auto rest = isNear(buffer.Fill(samples + i, count - i));
+    any = hn::Or(any, hn::And(rest, hn::FirstN(d, count - i)));
   }
-  const auto rest = hn::And(isNear(samples + i), hn::FirstN(d, count - i));
-  return !hn::AllFalse(d, hn::Or(any, rest));
+  return !hn::AllFalse(d, any);
 }
 
 template <typename T>
-HWY_ATTR void Replace(const ExcludedPixels<T>& excluded, std::size_t count, std::size_t channels,
-                      T* pixels) {
-  const ExcludedPixels<T> e = excluded;
+HWY_ATTR void Replace(const std::uint8_t* flags, const T* value, std::size_t count,
+                      std::size_t channels, T* pixels) {
   const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
     constexpr std::size_t kChannels = constant();
     using D = hn::ScalableTag<T>;
     const D d;
-    for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-      const auto isExcluded = LoadFlags(d, e.flags + i);
-      if (hn::AllFalse(d, isExcluded)) continue;
-      PixelVectors<D, kChannels> v(d, pixels + i * kChannels);
-      if (e.value != nullptr) {
-        v.Replace(isExcluded, e.value);
-      } else {
-        v.Replace(isExcluded, PixelVectors<D, kChannels>(d, e.old + i * kChannels));
-      }
-      v.Store(pixels + i * kChannels);
-    }
+    const auto replace = [&](std::size_t i, T* at) HWY_ATTR {
+      const auto isExcluded = LoadFlags(d, flags + i);
+      if (hn::AllFalse(d, isExcluded)) return;
+      PixelVectors<D, kChannels> v(d, at);
+      v.Replace(isExcluded, value);
+      v.Store(at);
+    };
+    std::size_t i = 0;
+    for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) replace(i, pixels + i * kChannels);
+    if (i == count) return;
+    PixelBuffer<D, kChannels> buffer;
+    replace(i, buffer.Fill(pixels + i * kChannels, count - i));
+    std::copy_n(buffer.samples, (count - i) * kChannels, pixels + i * kChannels);
   });
   if (done) return;
-  for (std::size_t i = 0; i < count * channels; ++i) {
-    if (e.flags[i / channels] == 0) continue;
-    pixels[i] = e.value != nullptr ? e.value[i % channels] : e.old[i];
-  }
-}
-
-HWY_ATTR void StreamAligned(const std::byte* from, std::size_t size, std::byte* to) {
-  const hn::ScalableTag<std::uint8_t> d;
-  const auto* const source = reinterpret_cast<const std::uint8_t*>(from);
-  auto* const target = reinterpret_cast<std::uint8_t*>(to);
-  for (std::size_t i = 0; i < size; i += hn::Lanes(d)) {
-    hn::Stream(hn::LoadU(d, source + i), d, target + i);
+  for (std::size_t i = 0; i < count; ++i) {
+    if (flags[i] != 0) std::copy_n(value, channels, pixels + i * channels);
   }
 }
 
 // The dispatch table holds plain functions: one entry per sample type.
-#define ZARN_ROW_FUNCTIONS(name, T)                                                               \
-  void Split##name(const T* pixels, std::size_t count, std::size_t channels, T* planes,           \
-                   std::size_t pitch) {                                                           \
-    Split(pixels, count, channels, planes, pitch);                                                \
-  }                                                                                               \
-  void Join##name(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,    \
-                  const ExcludedPixels<T>& excluded, T* pixels) {                                 \
-    Join(planes, pitch, count, channels, excluded, pixels);                                       \
-  }                                                                                               \
-  bool Flag##name(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,    \
-                  const T* noData, const std::uint8_t* mask, std::uint8_t* flags) {               \
-    return Flag(planes, pitch, count, channels, noData, mask, flags);                             \
-  }                                                                                               \
-  bool AnyNear##name(const T* samples, std::size_t count, T value) {                              \
-    return AnyNear(samples, count, value);                                                        \
-  }                                                                                               \
-  void Replace##name(const ExcludedPixels<T>& excluded, std::size_t count, std::size_t channels,  \
-                     T* pixels) {                                                                 \
-    Replace(excluded, count, channels, pixels);                                                   \
-  }                                                                                               \
-  void Widen##name(const T* samples, std::size_t count, double* values) {                         \
-    Widen(samples, count, values);                                                                \
-  }                                                                                               \
-  void Narrow##name(const double* values, std::size_t count, const OutputConverter<T>& converter, \
-                    T* samples) {                                                                 \
-    Narrow(values, count, converter, samples);                                                    \
+#define ZARN_ROW_FUNCTIONS(name, T)                                                             \
+  void Widen##name(const T* pixels, std::size_t count, std::size_t channels, double* values,    \
+                   std::size_t pitch) {                                                         \
+    Widen(pixels, count, channels, values, pitch);                                              \
+  }                                                                                             \
+  void Narrow##name(const double* values, std::size_t pitch, std::size_t count,                 \
+                    std::size_t channels, const ConverterConstants<T>* converters, T* pixels) { \
+    Narrow(values, pitch, count, channels, converters, pixels);                                 \
+  }                                                                                             \
+  bool Flag##name(const T* pixels, std::size_t count, std::size_t channels, const T* noData,    \
+                  const std::uint8_t* mask, std::uint8_t* flags) {                              \
+    return Flag(pixels, count, channels, noData, mask, flags);                                  \
+  }                                                                                             \
+  bool AnyNear##name(const T* samples, std::size_t count, T value) {                            \
+    return AnyNear(samples, count, value);                                                      \
+  }                                                                                             \
+  void Replace##name(const std::uint8_t* flags, const T* value, std::size_t count,              \
+                     std::size_t channels, T* pixels) {                                         \
+    Replace(flags, value, count, channels, pixels);                                             \
   }
 #define ZARN_SAMPLE_TYPES(macro)                                                         \
   macro(UInt8, std::uint8_t) macro(Int8, std::int8_t) macro(UInt16, std::uint16_t)       \
@@ -279,47 +320,35 @@ namespace zarn::processes::filters {
 // Explicit specialisations are exported unless told otherwise.
 #define ZARN_HIDDEN __attribute__((visibility("hidden")))
 #define ZARN_ROW_ENTRIES(name, T)                                                                 \
-  HWY_EXPORT(Split##name);                                                                        \
-  HWY_EXPORT(Join##name);                                                                         \
+  HWY_EXPORT(Widen##name);                                                                        \
+  HWY_EXPORT(Narrow##name);                                                                       \
   HWY_EXPORT(Flag##name);                                                                         \
   HWY_EXPORT(AnyNear##name);                                                                      \
   HWY_EXPORT(Replace##name);                                                                      \
-  HWY_EXPORT(Widen##name);                                                                        \
-  HWY_EXPORT(Narrow##name);                                                                       \
   template <>                                                                                     \
-  ZARN_HIDDEN void SplitChannels(const T* pixels, std::size_t count, std::size_t channels,        \
-                                 T* planes, std::size_t pitch) {                                  \
-    HWY_DYNAMIC_DISPATCH(Split##name)(pixels, count, channels, planes, pitch);                    \
+  ZARN_HIDDEN void WidenPixels(const T* pixels, std::size_t count, std::size_t channels,          \
+                               double* values, std::size_t pitch) {                               \
+    HWY_DYNAMIC_DISPATCH(Widen##name)(pixels, count, channels, values, pitch);                    \
   }                                                                                               \
   template <>                                                                                     \
-  ZARN_HIDDEN void JoinChannels(const T* planes, std::size_t pitch, std::size_t count,            \
-                                std::size_t channels, const ExcludedPixels<T>& excluded,          \
+  ZARN_HIDDEN void NarrowPixels(const double* values, std::size_t pitch, std::size_t count,       \
+                                std::size_t channels, const ConverterConstants<T>* converters,    \
                                 T* pixels) {                                                      \
-    HWY_DYNAMIC_DISPATCH(Join##name)(planes, pitch, count, channels, excluded, pixels);           \
+    HWY_DYNAMIC_DISPATCH(Narrow##name)(values, pitch, count, channels, converters, pixels);       \
   }                                                                                               \
   template <>                                                                                     \
-  ZARN_HIDDEN bool FlagExcluded(const T* planes, std::size_t pitch, std::size_t count,            \
-                                std::size_t channels, const T* noData, const std::uint8_t* mask,  \
-                                std::uint8_t* flags) {                                            \
-    return HWY_DYNAMIC_DISPATCH(Flag##name)(planes, pitch, count, channels, noData, mask, flags); \
+  ZARN_HIDDEN bool FlagExcluded(const T* pixels, std::size_t count, std::size_t channels,         \
+                                const T* noData, const std::uint8_t* mask, std::uint8_t* flags) { \
+    return HWY_DYNAMIC_DISPATCH(Flag##name)(pixels, count, channels, noData, mask, flags);        \
   }                                                                                               \
   template <>                                                                                     \
   ZARN_HIDDEN bool AnySampleNear(const T* samples, std::size_t count, T value) {                  \
     return HWY_DYNAMIC_DISPATCH(AnyNear##name)(samples, count, value);                            \
   }                                                                                               \
   template <>                                                                                     \
-  ZARN_HIDDEN void ReplaceExcluded(const ExcludedPixels<T>& excluded, std::size_t count,          \
+  ZARN_HIDDEN void ReplaceExcluded(const std::uint8_t* flags, const T* value, std::size_t count,  \
                                    std::size_t channels, T* pixels) {                             \
-    HWY_DYNAMIC_DISPATCH(Replace##name)(excluded, count, channels, pixels);                       \
-  }                                                                                               \
-  template <>                                                                                     \
-  ZARN_HIDDEN void WidenSamples(const T* samples, std::size_t count, double* values) {            \
-    HWY_DYNAMIC_DISPATCH(Widen##name)(samples, count, values);                                    \
-  }                                                                                               \
-  template <>                                                                                     \
-  ZARN_HIDDEN void NarrowSamples(const double* values, std::size_t count,                         \
-                                 const OutputConverter<T>& converter, T* samples) {               \
-    HWY_DYNAMIC_DISPATCH(Narrow##name)(values, count, converter, samples);                        \
+    HWY_DYNAMIC_DISPATCH(Replace##name)(flags, value, count, channels, pixels);                   \
   }
 ZARN_SAMPLE_TYPES(ZARN_ROW_ENTRIES)
 
@@ -331,19 +360,6 @@ void LookUpBytes(const std::uint8_t* pixels, std::size_t count, std::size_t chan
                  const ByteTable* tables, std::uint8_t* results) {
   HWY_DYNAMIC_DISPATCH(LookUp)(pixels, count, channels, tables, results);
 }
-
-HWY_EXPORT(StreamAligned);
-void StreamBytes(const std::byte* from, std::size_t size, std::byte* to) {
-  constexpr std::size_t kAlignment = 64;
-  const std::size_t past = reinterpret_cast<std::uintptr_t>(to) % kAlignment;
-  const std::size_t head = std::min(size, past == 0 ? 0 : kAlignment - past);
-  const std::size_t body = (size - head) / kAlignment * kAlignment;
-  std::memcpy(to, from, head);
-  HWY_DYNAMIC_DISPATCH(StreamAligned)(from + head, body, to + head);
-  std::memcpy(to + head + body, from + head + body, size - head - body);
-}
-
-void FinishStreaming() { hwy::FlushStream(); }
 
 }  // namespace zarn::processes::filters
 

@@ -5,62 +5,48 @@
 #include <cstddef>
 #include <cstdint>
 
-#include "processes/filters/framework/outputconverter.h"
+#include "processes/filters/framework/converterconstants.h"
 
 namespace zarn::processes::filters {
 
-/// Vector loops over runs of samples, for the eight sample types up to 32 bits and double. All rows
-/// are padded: they may be read and written up to this many elements past the length given.
+/// Vector loops over runs of interleaved pixels, for the eight sample types up to 32 bits and
+/// double. Samples of pixels and mask bytes are never touched past the run. Rows of our own are
+/// padded: they may be read and written up to this many elements past it.
 inline constexpr std::size_t kSampleRowPadding = 64;
 
 /// How far ahead loops over large blocks ask for memory: results that are written in between keep
 /// the machine from looking ahead by itself.
-inline constexpr std::size_t kBytesAhead = 2048;
+inline constexpr std::size_t kBytesAhead = 4096;
 
 /// Whether this machine has vectors at all: emulated ones would be slower than plain loops.
 bool HasVectors();
 
-/// Channels of `count` interleaved pixels, those of channel c from `planes + c * pitch` on.
+/// The samples of `count` pixels as doubles, those of channel c from `values + c * pitch` on, in
+/// padded rows.
 template <typename T>
-void SplitChannels(const T* pixels, std::size_t count, std::size_t channels, T* planes,
-                   std::size_t pitch);
+void WidenPixels(const T* pixels, std::size_t count, std::size_t channels, double* values,
+                 std::size_t pitch);
 
-/// What `JoinChannels` writes for pixels that are excluded.
+/// The inverse of `WidenPixels`, through the converter of each channel: the same bits.
 template <typename T>
-struct ExcludedPixels {
-  const std::uint8_t* flags = nullptr;  ///< one per pixel, not 0: excluded; null: none is
-  const T* value = nullptr;             ///< the pixel to write, or null for those of `old`
-  const T* old = nullptr;               ///< interleaved; looked at only without `value`
-};
+void NarrowPixels(const double* values, std::size_t pitch, std::size_t count, std::size_t channels,
+                  const ConverterConstants<T>* converters, T* pixels);
 
-/// The inverse of `SplitChannels`.
+/// Replaces those of `count` pixels that are flagged, in a padded row, by the pixel `value`.
 template <typename T>
-void JoinChannels(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
-                  const ExcludedPixels<T>& excluded, T* pixels);
-
-/// Replaces those of `count` interleaved pixels that are excluded.
-template <typename T>
-void ReplaceExcluded(const ExcludedPixels<T>& excluded, std::size_t count, std::size_t channels,
-                     T* pixels);
+void ReplaceExcluded(const std::uint8_t* flags, const T* value, std::size_t count,
+                     std::size_t channels, T* pixels);
 
 /// Flags the pixels whose mask byte is 0 or whose channels all equal `noData` (as
-/// `PixelNearlyEquals` has it) and tells whether there are any. Either pointer may be null.
+/// `PixelNearlyEquals` has it) in a padded row and tells whether there are any. Either pointer may
+/// be null.
 template <typename T>
-bool FlagExcluded(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
-                  const T* noData, const std::uint8_t* mask, std::uint8_t* flags);
+bool FlagExcluded(const T* pixels, std::size_t count, std::size_t channels, const T* noData,
+                  const std::uint8_t* mask, std::uint8_t* flags);
 
 /// Whether any of the samples may nearly equal `value`: false is certain, true is not.
 template <typename T>
 bool AnySampleNear(const T* samples, std::size_t count, T value);
-
-/// Samples as doubles.
-template <typename T>
-void WidenSamples(const T* samples, std::size_t count, double* values);
-
-/// `converter` applied to `count` values: the same bits.
-template <typename T>
-void NarrowSamples(const double* values, std::size_t count, const OutputConverter<T>& converter,
-                   T* samples);
 
 /// What becomes of each of the 256 values of a byte.
 using ByteTable = std::array<std::uint8_t, 256>;
@@ -69,10 +55,5 @@ using ByteTable = std::array<std::uint8_t, 256>;
 /// the place of the pixels.
 void LookUpBytes(const std::uint8_t* pixels, std::size_t count, std::size_t channels,
                  const ByteTable* tables, std::uint8_t* results);
-
-/// Copies `size` bytes past the caches; for results that are too large to stay in them. The regions
-/// do not overlap. `FinishStreaming` comes before the thread lets others see them.
-void StreamBytes(const std::byte* from, std::size_t size, std::byte* to);
-void FinishStreaming();
 
 }  // namespace zarn::processes::filters

@@ -2,8 +2,8 @@
 #include "processes/filters/normalization/hotspotnorm.h"
 
 #include <algorithm>
-#include <array>
 #include <cstddef>
+#include <vector>
 
 #include "host/sys/vectorised.h"
 #include "processes/filters/colorbalance/balanceblock.h"
@@ -17,12 +17,13 @@ double Surface(const double* p, double x, double y) {
   return (y * p[1] + p[3] + x * p[0]) * x + y * p[2] * y + y * p[4] + p[5];
 }
 
-/// Columns of the image, divided by its extent.
-ZARN_VECTORISED
-void PlaceColumns(std::uint32_t column, std::size_t count, double columns, double* x) {
+/// The block's columns in the image, divided by its extent.
+std::vector<double> PlaceColumns(std::uint32_t column, std::size_t count, double columns) {
+  std::vector<double> x(count);
   for (std::size_t i = 0; i < count; ++i) {
     x[i] = static_cast<double>(column + static_cast<std::uint32_t>(i)) / columns;
   }
+  return x;
 }
 
 /// A channel's part of a run.
@@ -35,22 +36,17 @@ void BalanceRun(double* values, std::size_t count, const double* x, double y,
 }
 
 struct HotSpots {
-  void Run(const PixelRun& run) {
-    const auto column = x0 + static_cast<std::uint32_t>(run.column);
-    const auto row = y0 + static_cast<std::uint32_t>(run.row);
-    PlaceColumns(column, run.count, columns, x.data());
-    const double y = static_cast<double>(row) / rows;
+  void Run(const PixelRun& run) const {
+    const double y = static_cast<double>(y0 + static_cast<std::uint32_t>(run.row)) / rows;
     for (std::size_t c = 0; c < run.channels; ++c) {
-      BalanceRun(run.Channel(c), run.count, x.data(), y, coefficients[c].data());
+      BalanceRun(run.Channel(c), run.count, x + run.column, y, coefficients[c].data());
     }
   }
 
   const std::vector<double>* coefficients;
-  double columns;
+  const double* x;  ///< of each column of the block
   double rows;
-  std::uint32_t x0;
   std::uint32_t y0;
-  std::array<double, kRunPixels> x{};  ///< of the run, for all channels
 };
 
 // Channels until the first one whose coefficients are not complete.
@@ -75,13 +71,11 @@ FilterResult CPUHotSpotNorm::Process(const gobs::Raster& input, gobs::Raster& ou
     }
     const BalanceJob<T> job(input, output, inputNoData, outputNoData, inputMask,
                             MakeConverters<T>(bounds, outputNoData));
-    const HotSpots correction{coefficients.data(),
-                              static_cast<double>(columnDivisor),
-                              static_cast<double>(rowDivisor),
-                              blockX,
-                              blockY,
-                              {}};
-    Balance(job, ShareAlways(input), correction);
+    const std::vector<double> x =
+        PlaceColumns(blockX, input.Width(), static_cast<double>(columnDivisor));
+    const HotSpots correction{coefficients.data(), x.data(), static_cast<double>(rowDivisor),
+                              blockY};
+    Balance(job, ShareAlways(), correction);
     return FilterResult::Success();
   });
 }

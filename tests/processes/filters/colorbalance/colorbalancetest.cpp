@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <gtest/gtest.h>
+#include <sys/mman.h>
 
 #include <array>
 #include <cstring>
@@ -131,6 +132,24 @@ TEST(ColorBalance, RefusesWhatItCannotDoAndLeavesTheOutput) {
     gobs::Raster empty = Block(0, 0, 3);
     EXPECT_TRUE(filter->Process(empty, empty, 0, 0, nullptr).Ok());
   }
+}
+
+TEST(ColorBalance, NeverTouchesExcludedPixelsWithoutAnOutputValue) {
+  // Others may be writing there: reading and writing back the same would undo it.
+  const std::size_t bytes = 3 * 4096;
+  void* const memory = mmap(nullptr, bytes, PROT_READ, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+  ASSERT_NE(memory, MAP_FAILED);
+  const std::vector<std::uint8_t> mask(4096, 0);
+  for (const Family& family : Families()) {
+    SCOPED_TRACE(family.name);
+    const std::unique_ptr<IFilter> filter(family.make());
+    for (const auto code : {NativeDataTypeCode::kUInt8, NativeDataTypeCode::kUInt16}) {
+      const std::uint32_t height = code == NativeDataTypeCode::kUInt8 ? 64 : 32;
+      gobs::Raster output(gobs::RasterInfo(64, height, 3, code), memory, bytes);
+      EXPECT_TRUE(filter->Process(Block(64, height, 3, code), output, 0, 0, mask.data()).Ok());
+    }
+  }
+  munmap(memory, bytes);
 }
 
 TEST(ColorBalance, KnowsItsSampleTypes) {
