@@ -124,7 +124,8 @@ void WriteRun(const BalanceJob<T>& job, std::size_t begin, std::size_t count,
 }
 
 /// The same as `BalancePixels`, bit for bit, over runs of pixels of one row. The constants are
-/// those of the job's converters.
+/// those of the job's converters. The steps of a run keep the machine from looking ahead by itself,
+/// so each asks for what the next one waits for.
 template <typename T, class Correction>
 void BalanceRuns(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
                  Correction& correction, const ConverterConstants<T>* constants,
@@ -136,10 +137,13 @@ void BalanceRuns(const BalanceJob<T>& job, std::size_t begin, std::size_t end,
     const std::size_t column = i % job.width;
     const std::size_t count = std::min({scratch.Run(), job.width - column, end - i});
     const std::uint8_t* const excluded = FindExcluded(job, i, count, scratch);
-    WidenPixels(job.input + i * channels, count, channels, values, pitch);
+    WidenPixels(job.input + i * channels, count, channels, job.output + i * channels, values,
+                pitch);
     correction.Run({values, pitch, count, channels, column, i / job.width, excluded});
-    WriteRun(job, i, count, excluded, scratch,
-             [&](T* results) { NarrowPixels(values, pitch, count, channels, constants, results); });
+    WriteRun(job, i, count, excluded, scratch, [&](T* results) {
+      NarrowPixels(values, pitch, count, channels, constants, job.input + (i + count) * channels,
+                   results);
+    });
     i += count;
   }
 }

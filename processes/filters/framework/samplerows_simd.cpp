@@ -44,8 +44,8 @@ struct PixelBuffer {
 };
 
 template <typename T>
-HWY_ATTR void Widen(const T* pixels, std::size_t count, std::size_t channels, double* values,
-                    std::size_t pitch) {
+HWY_ATTR void Widen(const T* pixels, std::size_t count, std::size_t channels, const T* ahead,
+                    double* values, std::size_t pitch) {
   using D = hn::ScalableTag<T>;
   const D d;
   const hn::ScalableTag<double> wide;
@@ -54,10 +54,10 @@ HWY_ATTR void Widen(const T* pixels, std::size_t count, std::size_t channels, do
     PixelBuffer<D, kChannels> buffer;
     for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
       const T* from = pixels + i * kChannels;
-      for (std::size_t c = 0; c < kChannels; ++c) {
-        hwy::Prefetch(from + c * hn::Lanes(d) + kBytesAhead / sizeof(T));
-      }
       if (i + hn::Lanes(d) > count) from = buffer.Fill(from, count - i);
+      for (std::size_t c = 0; c < kChannels; ++c) {
+        hwy::Prefetch(ahead + i * kChannels + c * hn::Lanes(d));
+      }
       const PixelVectors<D, kChannels> v(d, from);
       for (std::size_t c = 0; c < kChannels; ++c) {
         HWY_ALIGN T row[hn::MaxLanes(d)];
@@ -78,7 +78,8 @@ HWY_ATTR void Widen(const T* pixels, std::size_t count, std::size_t channels, do
 
 template <typename T>
 HWY_ATTR void Narrow(const double* values, std::size_t pitch, std::size_t count,
-                     std::size_t channels, const ConverterConstants<T>* converters, T* pixels) {
+                     std::size_t channels, const ConverterConstants<T>* converters, const T* ahead,
+                     T* pixels) {
   using D = hn::ScalableTag<T>;
   using Wide = hn::ScalableTag<double>;
   const D d;
@@ -87,7 +88,9 @@ HWY_ATTR void Narrow(const double* values, std::size_t pitch, std::size_t count,
   constexpr std::size_t kRow = 256;
   const auto narrow = [&](std::size_t begin, std::size_t end, std::size_t c, T* row) HWY_ATTR {
     const ConverterVectors<T, Wide> convert(wide, converters[c]);
+    const T* const wanted = ahead + (begin + c * (end - begin));
     for (std::size_t i = begin; i < end; i += hn::Lanes(wide)) {
+      hwy::Prefetch(wanted + (i - begin));
       convert.Store(hn::LoadU(wide, values + c * pitch + i), row + (i - begin));
     }
   };
@@ -284,25 +287,26 @@ HWY_ATTR void Replace(const std::uint8_t* flags, const T* value, std::size_t cou
 }
 
 // The dispatch table holds plain functions: one entry per sample type.
-#define ZARN_ROW_FUNCTIONS(name, T)                                                             \
-  void Widen##name(const T* pixels, std::size_t count, std::size_t channels, double* values,    \
-                   std::size_t pitch) {                                                         \
-    Widen(pixels, count, channels, values, pitch);                                              \
-  }                                                                                             \
-  void Narrow##name(const double* values, std::size_t pitch, std::size_t count,                 \
-                    std::size_t channels, const ConverterConstants<T>* converters, T* pixels) { \
-    Narrow(values, pitch, count, channels, converters, pixels);                                 \
-  }                                                                                             \
-  bool Flag##name(const T* pixels, std::size_t count, std::size_t channels, const T* noData,    \
-                  const std::uint8_t* mask, std::uint8_t* flags) {                              \
-    return Flag(pixels, count, channels, noData, mask, flags);                                  \
-  }                                                                                             \
-  bool AnyNear##name(const T* samples, std::size_t count, T value) {                            \
-    return AnyNear(samples, count, value);                                                      \
-  }                                                                                             \
-  void Replace##name(const std::uint8_t* flags, const T* value, std::size_t count,              \
-                     std::size_t channels, T* pixels) {                                         \
-    Replace(flags, value, count, channels, pixels);                                             \
+#define ZARN_ROW_FUNCTIONS(name, T)                                                                \
+  void Widen##name(const T* pixels, std::size_t count, std::size_t channels, const T* ahead,       \
+                   double* values, std::size_t pitch) {                                            \
+    Widen(pixels, count, channels, ahead, values, pitch);                                          \
+  }                                                                                                \
+  void Narrow##name(const double* values, std::size_t pitch, std::size_t count,                    \
+                    std::size_t channels, const ConverterConstants<T>* converters, const T* ahead, \
+                    T* pixels) {                                                                   \
+    Narrow(values, pitch, count, channels, converters, ahead, pixels);                             \
+  }                                                                                                \
+  bool Flag##name(const T* pixels, std::size_t count, std::size_t channels, const T* noData,       \
+                  const std::uint8_t* mask, std::uint8_t* flags) {                                 \
+    return Flag(pixels, count, channels, noData, mask, flags);                                     \
+  }                                                                                                \
+  bool AnyNear##name(const T* samples, std::size_t count, T value) {                               \
+    return AnyNear(samples, count, value);                                                         \
+  }                                                                                                \
+  void Replace##name(const std::uint8_t* flags, const T* value, std::size_t count,                 \
+                     std::size_t channels, T* pixels) {                                            \
+    Replace(flags, value, count, channels, pixels);                                                \
   }
 #define ZARN_SAMPLE_TYPES(macro)                                                         \
   macro(UInt8, std::uint8_t) macro(Int8, std::int8_t) macro(UInt16, std::uint16_t)       \
@@ -319,36 +323,36 @@ namespace zarn::processes::filters {
 
 // Explicit specialisations are exported unless told otherwise.
 #define ZARN_HIDDEN __attribute__((visibility("hidden")))
-#define ZARN_ROW_ENTRIES(name, T)                                                                 \
-  HWY_EXPORT(Widen##name);                                                                        \
-  HWY_EXPORT(Narrow##name);                                                                       \
-  HWY_EXPORT(Flag##name);                                                                         \
-  HWY_EXPORT(AnyNear##name);                                                                      \
-  HWY_EXPORT(Replace##name);                                                                      \
-  template <>                                                                                     \
-  ZARN_HIDDEN void WidenPixels(const T* pixels, std::size_t count, std::size_t channels,          \
-                               double* values, std::size_t pitch) {                               \
-    HWY_DYNAMIC_DISPATCH(Widen##name)(pixels, count, channels, values, pitch);                    \
-  }                                                                                               \
-  template <>                                                                                     \
-  ZARN_HIDDEN void NarrowPixels(const double* values, std::size_t pitch, std::size_t count,       \
-                                std::size_t channels, const ConverterConstants<T>* converters,    \
-                                T* pixels) {                                                      \
-    HWY_DYNAMIC_DISPATCH(Narrow##name)(values, pitch, count, channels, converters, pixels);       \
-  }                                                                                               \
-  template <>                                                                                     \
-  ZARN_HIDDEN bool FlagExcluded(const T* pixels, std::size_t count, std::size_t channels,         \
-                                const T* noData, const std::uint8_t* mask, std::uint8_t* flags) { \
-    return HWY_DYNAMIC_DISPATCH(Flag##name)(pixels, count, channels, noData, mask, flags);        \
-  }                                                                                               \
-  template <>                                                                                     \
-  ZARN_HIDDEN bool AnySampleNear(const T* samples, std::size_t count, T value) {                  \
-    return HWY_DYNAMIC_DISPATCH(AnyNear##name)(samples, count, value);                            \
-  }                                                                                               \
-  template <>                                                                                     \
-  ZARN_HIDDEN void ReplaceExcluded(const std::uint8_t* flags, const T* value, std::size_t count,  \
-                                   std::size_t channels, T* pixels) {                             \
-    HWY_DYNAMIC_DISPATCH(Replace##name)(flags, value, count, channels, pixels);                   \
+#define ZARN_ROW_ENTRIES(name, T)                                                                  \
+  HWY_EXPORT(Widen##name);                                                                         \
+  HWY_EXPORT(Narrow##name);                                                                        \
+  HWY_EXPORT(Flag##name);                                                                          \
+  HWY_EXPORT(AnyNear##name);                                                                       \
+  HWY_EXPORT(Replace##name);                                                                       \
+  template <>                                                                                      \
+  ZARN_HIDDEN void WidenPixels(const T* pixels, std::size_t count, std::size_t channels,           \
+                               const T* ahead, double* values, std::size_t pitch) {                \
+    HWY_DYNAMIC_DISPATCH(Widen##name)(pixels, count, channels, ahead, values, pitch);              \
+  }                                                                                                \
+  template <>                                                                                      \
+  ZARN_HIDDEN void NarrowPixels(const double* values, std::size_t pitch, std::size_t count,        \
+                                std::size_t channels, const ConverterConstants<T>* converters,     \
+                                const T* ahead, T* pixels) {                                       \
+    HWY_DYNAMIC_DISPATCH(Narrow##name)(values, pitch, count, channels, converters, ahead, pixels); \
+  }                                                                                                \
+  template <>                                                                                      \
+  ZARN_HIDDEN bool FlagExcluded(const T* pixels, std::size_t count, std::size_t channels,          \
+                                const T* noData, const std::uint8_t* mask, std::uint8_t* flags) {  \
+    return HWY_DYNAMIC_DISPATCH(Flag##name)(pixels, count, channels, noData, mask, flags);         \
+  }                                                                                                \
+  template <>                                                                                      \
+  ZARN_HIDDEN bool AnySampleNear(const T* samples, std::size_t count, T value) {                   \
+    return HWY_DYNAMIC_DISPATCH(AnyNear##name)(samples, count, value);                             \
+  }                                                                                                \
+  template <>                                                                                      \
+  ZARN_HIDDEN void ReplaceExcluded(const std::uint8_t* flags, const T* value, std::size_t count,   \
+                                   std::size_t channels, T* pixels) {                              \
+    HWY_DYNAMIC_DISPATCH(Replace##name)(flags, value, count, channels, pixels);                    \
   }
 ZARN_SAMPLE_TYPES(ZARN_ROW_ENTRIES)
 

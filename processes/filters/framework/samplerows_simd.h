@@ -22,15 +22,17 @@ inline constexpr std::size_t kBytesAhead = 4096;
 bool HasVectors();
 
 /// The samples of `count` pixels as doubles, those of channel c from `values + c * pitch` on, in
-/// padded rows.
+/// padded rows. Meanwhile the machine is asked for the memory of as many pixels `ahead`, which is
+/// not accessed.
 template <typename T>
-void WidenPixels(const T* pixels, std::size_t count, std::size_t channels, double* values,
-                 std::size_t pitch);
+void WidenPixels(const T* pixels, std::size_t count, std::size_t channels, const T* ahead,
+                 double* values, std::size_t pitch);
 
-/// The inverse of `WidenPixels`, through the converter of each channel: the same bits.
+/// The inverse of `WidenPixels`, through the converter of each channel: the same bits. Asks for the
+/// memory `ahead` as well.
 template <typename T>
 void NarrowPixels(const double* values, std::size_t pitch, std::size_t count, std::size_t channels,
-                  const ConverterConstants<T>* converters, T* pixels);
+                  const ConverterConstants<T>* converters, const T* ahead, T* pixels);
 
 /// Replaces those of `count` pixels that are flagged, in a padded row, by the pixel `value`.
 template <typename T>

@@ -114,7 +114,7 @@ class SampleRows : public ::testing::TestWithParam<std::int64_t> {
     using Limits = std::numeric_limits<T>;
     std::vector<T> samples = Samples<T>(count * channels);
     std::vector<double> values(kPitch * channels);
-    WidenPixels(samples.data(), count, channels, values.data(), kPitch);
+    WidenPixels(samples.data(), count, channels, samples.data(), values.data(), kPitch);
     for (std::size_t i = 0; i < count * channels; ++i) {
       ASSERT_EQ(values[i % channels * kPitch + i / channels], static_cast<double>(samples[i]));
     }
@@ -142,7 +142,8 @@ class SampleRows : public ::testing::TestWithParam<std::int64_t> {
         converters.push_back(all[(first + c) % all.size()]);
       const std::vector<ConverterConstants<T>> constants(converters.begin(), converters.end());
       samples.assign(count * channels + 1, T{42});
-      NarrowPixels(values.data(), kPitch, count, channels, constants.data(), samples.data());
+      NarrowPixels(values.data(), kPitch, count, channels, constants.data(), samples.data(),
+                   samples.data());
       ASSERT_EQ(samples.back(), T{42});
       for (std::size_t i = 0; i < count * channels; ++i) {
         const double value = values[i % channels * kPitch + i / channels];
