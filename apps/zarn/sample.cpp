@@ -220,7 +220,7 @@ void WriteParameters(const StagingFolder& file, std::uint32_t seed,
   CPLJSONObject root = document.GetRoot();
   root.Add("seed", static_cast<GInt64>(seed));
   root.Add("model",
-           "scene = gain * truth + offset + strength * max(0, 1 - r^2)^2 + noise, per channel "
+           "scene = gain * truth + offset + strength * (1 - r^2) + noise, per channel "
            "(red, green, blue); r^2 = ((x - centre_x) / radius_x)^2 + ((y - centre_y) / "
            "radius_y)^2, x and y being map coordinates of the pixel's centre. Outliers, at most "
            "one in every 16 x 16 pixels, replace all channels.");

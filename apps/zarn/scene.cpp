@@ -73,8 +73,7 @@ Picture Paint(const Window& window, const ColorAt& colorAt) {
 double HotSpot::ShareAt(Vec p) const {
   const double x = (p.x - centre.x) / radii.x;
   const double y = (p.y - centre.y) / radii.y;
-  const double inside = std::max(0.0, 1.0 - (x * x + y * y));
-  return inside * inside;
+  return 1.0 - (x * x + y * y);
 }
 
 Color Radiometry::Disturb(const Color& land, Vec p) const {
@@ -159,16 +158,17 @@ Color Scene::Observe(const Color& land, std::int64_t column, std::int64_t row) c
 double Scene::LargestNoise() const { return radiometry_.noise / kBellDeviation * kBellReach; }
 
 std::array<Scene, 2> MakeScenes(std::uint64_t seed) {
+  // The hot spots reach to the frames' corners.
   // A hazy morning, and a clear day with a warmer sensor.
   const Window left{0, 0, 1500, 1240};
   const Window right{852, 40, 1500, 1160};
   const Radiometry hazy{{0.84375, 0.875, 0.875},
                         {10.0, 12.0, 24.0},
-                        {{430.0, 390.0}, {760.0, 620.0}, {56.0, 54.0, 46.0}},
+                        {{430.0, 390.0}, {1500.0, 1250.0}, {56.0, 54.0, 46.0}},
                         1.25};
   const Radiometry clear{{1.15625, 1.09375, 0.96875},
                          {-2.0, -3.0, -6.0},
-                         {{1960.0, 800.0}, {640.0, 720.0}, {36.0, 34.0, 26.0}},
+                         {{1960.0, 800.0}, {1560.0, 1080.0}, {36.0, 34.0, 26.0}},
                          1.5};
   return {Scene(Hash(seed, 1), left, hazy, 0.021, {42.0, 48.0}),
           Scene(Hash(seed, 2), right, clear, -0.018, {42.0, 60.0})};

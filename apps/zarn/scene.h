@@ -16,13 +16,13 @@ namespace zarn::app {
 /// How much finer the 16-bit pictures are: their values go up to 4095, as from a 12-bit sensor.
 inline constexpr double kWordScale = 16.0;
 
-/// A bright spot that fades smoothly to nothing on an ellipse.
+/// A broad bright bulge: the land seen with the sun behind the camera.
 struct HotSpot {
   Vec centre;
   Vec radii;
   Color strength;  ///< what it adds at its centre, per channel
 
-  /// The share of `strength` at `p`: (1 - r^2)^2, where r is 0 in the centre and 1 on the ellipse.
+  /// The share of `strength` at `p`: 1 - r^2, where r is 0 in the centre and 1 on the ellipse.
   double ShareAt(Vec p) const;
 };
 
