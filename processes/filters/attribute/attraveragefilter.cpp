@@ -4,12 +4,14 @@
 #include <cstddef>
 
 #include "host/gobs/saturatecast.h"
+#include "processes/filters/attribute/filteralgo.h"
 #include "processes/filters/attribute/poolblock.h"
 
 namespace zarn::processes::filters {
 namespace {
 
 struct Mean {
+  static constexpr FILTERALGO kAlgo = FILTERALGO::kAverage;
   static constexpr const char* kUnknownType = "Unknown raster block data type for average filter.";
   static constexpr const char* kUnknownAttributeType =
       "Unknown attribute raster data type for average filter.";

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cstddef>
 
+#include "processes/filters/attribute/filteralgo.h"
 #include "processes/filters/attribute/poolblock.h"
 #include "processes/filters/framework/orderedkeys.h"
 
@@ -11,6 +12,7 @@ namespace zarn::processes::filters {
 namespace {
 
 struct Median {
+  static constexpr FILTERALGO kAlgo = FILTERALGO::kMedian;
   static constexpr const char* kUnknownType = "Unknown raster block data type for median filter.";
   static constexpr const char* kUnknownAttributeType =
       "Unknown attribute raster data type for median filter.";

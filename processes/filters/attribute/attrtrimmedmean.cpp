@@ -5,6 +5,7 @@
 #include <cstddef>
 
 #include "host/gobs/saturatecast.h"
+#include "processes/filters/attribute/filteralgo.h"
 #include "processes/filters/attribute/poolblock.h"
 #include "processes/filters/framework/orderedkeys.h"
 
@@ -12,6 +13,7 @@ namespace zarn::processes::filters {
 namespace {
 
 struct TrimmedMean {
+  static constexpr FILTERALGO kAlgo = FILTERALGO::kTrimmedMean;
   static constexpr const char* kUnknownType =
       "Unknown raster block data type for trimmed mean filter.";
   static constexpr const char* kUnknownAttributeType =

@@ -9,6 +9,9 @@
 #include "host/gobs/raster.h"
 #include "host/gobs/saturatecast.h"
 #include "processes/filters/framework/nodata.h"
+#if ZARN_SIMD
+#include "processes/filters/attribute/poolflags_simd.h"
+#endif
 
 namespace zarn::processes::filters {
 
@@ -57,6 +60,22 @@ class LabelRaster {
   /// Whether the labels at two positions are pooled, in coordinates of the image.
   virtual bool Pools(std::ptrdiff_t x, std::ptrdiff_t y, std::ptrdiff_t nx,
                      std::ptrdiff_t ny) const = 0;
+
+#if ZARN_SIMD
+  /// Bytes of one label.
+  virtual std::size_t LabelSize() const = 0;
+  /// Whether `FlagPools` holds for this tolerance: it knows no rule under which labels differ from
+  /// themselves.
+  virtual bool HasVectors() const = 0;
+  /// Labels of `count` pixels of row `y` from column `x` on, as many as there are pixels. `row` is
+  /// aligned for labels and padded by `kSampleRowPadding` of them.
+  virtual void ReadRow(std::ptrdiff_t x, std::ptrdiff_t y, std::size_t count, void* row) const = 0;
+  /// Flags the pixels of such a row that have no label, and tells whether there are any. The flags
+  /// are padded likewise.
+  virtual bool FlagUnlabelled(const void* row, std::size_t count, std::uint8_t* flags) const = 0;
+  /// Tells which neighbours are pooled, for labels from `ReadRow`.
+  virtual void FlagPools(const PoolRun& run) const = 0;
+#endif
 };
 
 /// The first channel of `attr`, each of whose pixels serves `scale` times `scale` pixels of the

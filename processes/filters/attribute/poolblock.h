@@ -4,7 +4,9 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <new>
 #include <type_traits>
+#include <utility>
 #include <vector>
 
 #include "host/sys/openmp.h"
@@ -14,6 +16,9 @@
 #include "processes/filters/framework/blockchecks.h"
 #include "processes/filters/framework/parallel.h"
 #include "processes/filters/framework/sampletypes.h"
+#if ZARN_SIMD
+#include "processes/filters/attribute/pooledrows.h"
+#endif
 
 namespace zarn::processes::filters {
 
@@ -43,6 +48,22 @@ template <class Statistic, typename T>
 void RunPools(const PoolingJob<T>& job) {
   const std::ptrdiff_t rows = job.output.Height();
   const std::ptrdiff_t bands = parallel::BandCount(rows);
+#if ZARN_SIMD
+  if (const PoolPlan<T> plan(job, Statistic::kAlgo); plan.Usable()) {
+    constexpr std::align_val_t kAlignment{64};
+    const std::size_t bytes = PoolScratch<T>::Bytes(plan);
+    const std::size_t size = bytes * static_cast<std::size_t>(bands);
+    const auto release = [&](std::byte* memory) { ::operator delete[](memory, kAlignment); };
+    const std::unique_ptr<std::byte[], decltype(release)> scratch(
+        new (kAlignment) std::byte[size](), release);
+    parallel::ForEachRowBand(
+        rows, bands, [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
+          PooledRows<T>(job, plan, scratch.get() + static_cast<std::size_t>(band) * bytes)
+              .Run(begin, end);
+        });
+    return;
+  }
+#endif
   const std::size_t cells = job.offsets.size();
   std::vector<const T*> pools(static_cast<std::size_t>(bands) * cells);
   std::vector<T> samples(pools.size());
@@ -53,8 +74,9 @@ void RunPools(const PoolingJob<T>& job) {
       });
 }
 
-/// Processes a block with one of the filters: `Statistic` has their reduction `Of(samples, count)`,
-/// which may reorder the samples, and their texts.
+/// Processes a block with one of the filters: `Statistic` has its reduction `Of(samples, count)`,
+/// which may reorder the samples, its number, and
+/// its texts.
 template <class Statistic>
 FilterResult PoolBlock(const PoolCall& call) {
   const IAttributeFilter& settings = call.settings;
