@@ -36,7 +36,9 @@ class PoolPlan {
     if (!usable_) return;
     const auto width = static_cast<std::size_t>(job.output.Width());
     strip_ = std::min(std::max(kStrip, 8 * reachX_), width);
-    segment_ = kPoolGroup * std::clamp<std::size_t>(kFlagBytes / (kPoolGroup * cells_), 1, 8);
+    // Whole blocks of the ordering loops.
+    constexpr std::size_t kBlock = std::max<std::size_t>(kPoolGroup, PoolWorkBytes(1) / sizeof(T));
+    segment_ = kBlock * std::clamp<std::size_t>(kFlagBytes / (kBlock * cells_), 1, 512 / kBlock);
     if (algo == FILTERALGO::kMedian) {
       network_ = SelectionNetwork(cells_, cells_ / 2, cells_ / 2);
     } else if (algo == FILTERALGO::kTrimmedMean) {
@@ -321,25 +323,16 @@ class PooledRows {
   void Write(std::ptrdiff_t x, std::ptrdiff_t y, std::size_t count) const {
     T* const out = job_.output.Pixel(x, y);
     const std::size_t samples = count * plan_.Channels();
-    std::uint8_t any = 0;
-    for (std::size_t i = 0; i < count; ++i) {
-      scratch_.kept[i] = scratch_.counts16[i] == 0 ? 1 : 0;
-      any |= scratch_.kept[i];
-    }
-    if (job_.hasOutputMask) {
-      const std::uint8_t* const mask = job_.outputMask.Pixel(x, y);
-      for (std::size_t i = 0; i < count; ++i) {
-        scratch_.kept[i] |= mask[i] == 0 ? 1 : 0;
-        any |= scratch_.kept[i];
-      }
-    }
-    if (any == 0 && plan_.Channels() == 1) {
+    const bool any =
+        FlagKept(scratch_.counts16, job_.hasOutputMask ? job_.outputMask.Pixel(x, y) : nullptr,
+                 count, scratch_.kept);
+    if (!any && plan_.Channels() == 1) {
       std::memcpy(out, scratch_.results, samples * sizeof(T));
       return;
     }
-    if (any != 0) std::memcpy(scratch_.old, out, samples * sizeof(T));
+    if (any) std::memcpy(scratch_.old, out, samples * sizeof(T));
     JoinChannels(scratch_.results, plan_.SegmentPitch(), count, plan_.Channels(),
-                 ExcludedPixels<T>{any != 0 ? scratch_.kept : nullptr, nullptr, scratch_.old},
+                 ExcludedPixels<T>{any ? scratch_.kept : nullptr, nullptr, scratch_.old},
                  scratch_.joined);
     std::memcpy(out, scratch_.joined, samples * sizeof(T));
   }

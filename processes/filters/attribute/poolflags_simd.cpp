@@ -2,6 +2,7 @@
 #include "processes/filters/attribute/poolflags_simd.h"
 
 #include <algorithm>
+#include <cstring>
 #include <type_traits>
 
 // Targets that share their kernels with another one, and those whose vectors may be wider than the
@@ -55,43 +56,73 @@ class PoolCounts {
 
 constexpr std::size_t kCellsPerByte = 255;
 
+/// The flags of one cell's neighbours from pixel `at` on, as lanes of zeros and ones.
+template <class D, class Near>
+HWY_INLINE hn::Vec<hn::RebindToUnsigned<D>> FlagVector(D d, const NeighbourRow& cell,
+                                                       std::size_t at, hn::Vec<D> centre,
+                                                       const std::uint8_t* centreUnlabelled,
+                                                       const Near& near) {
+  const hn::RebindToUnsigned<D> du;
+  auto pooled = near(centre, hn::LoadU(d, static_cast<const hn::TFromD<D>*>(cell.labels) + at));
+  if (centreUnlabelled != nullptr) pooled = hn::Or(pooled, LoadFlags(d, centreUnlabelled + at));
+  if (cell.unlabelled != nullptr) pooled = hn::Or(pooled, LoadFlags(d, cell.unlabelled + at));
+  if (cell.excluded != nullptr) {
+    pooled = hn::AndNot(LoadFlags(d, cell.excluded + at), pooled);
+  }
+  return hn::VecFromMask(du, hn::RebindMask(du, pooled));
+}
+
+/// Flags and counts `kVectors` vectors of bytes from pixel x of the run on: several share the work
+/// of finding the rows.
+template <std::size_t kVectors, class D, class Near>
+HWY_INLINE void FlagBytes(D d, const PoolRun& run, std::size_t x, const Near& near) {
+  const NeighbourRow* const cells = run.cells;
+  const std::uint8_t* const unlabelled = run.centre.unlabelled;
+  const std::size_t pitch = run.pitch;
+  const std::size_t at = run.first + x;
+  const std::size_t lanes = hn::Lanes(d);
+  const auto* const labels = static_cast<const hn::TFromD<D>*>(run.centre.labels) + at;
+  hn::Vec<D> centres[kVectors];
+  PoolCounts counts[kVectors];
+  for (std::size_t v = 0; v < kVectors; ++v) centres[v] = hn::LoadU(d, labels + v * lanes);
+  std::uint8_t* to = run.flags + x;
+  const std::size_t cellCount = run.cellCount;
+  for (std::size_t begin = 0; begin < cellCount; begin += kCellsPerByte) {
+    const std::size_t end = std::min(cellCount, begin + kCellsPerByte);
+    for (std::size_t k = begin; k < end; ++k, to += pitch) {
+      const NeighbourRow cell = cells[k];
+      for (std::size_t v = 0; v < kVectors; ++v) {
+        const auto flags = FlagVector(d, cell, at + v * lanes, centres[v], unlabelled, near);
+        hn::StoreU(flags, d, to + v * lanes);
+        counts[v].Add(flags);
+      }
+    }
+    for (PoolCounts& count : counts) count.Widen();
+  }
+  for (std::size_t v = 0; v < kVectors; ++v) counts[v].Store(run, x + v * lanes);
+}
+
 /// `near(centre, neighbour)` tells which lanes of two vectors of labels belong together.
 template <class D, class Near>
 HWY_ATTR void FlagCells(D d, const PoolRun& run, const Near& near) {
   using A = hn::TFromD<D>;
-  const hn::RebindToUnsigned<D> du;
-  const hn::Rebind<std::uint8_t, D> d8;
-  constexpr bool kBytes = sizeof(A) == 1;
-  for (std::size_t x = 0; x < run.count; x += hn::Lanes(d)) {
-    const std::size_t at = run.first + x;
-    const auto centre = hn::LoadU(d, static_cast<const A*>(run.centre.labels) + at);
-    auto always = hn::MaskFromVec(hn::Zero(d));
-    if (run.centre.unlabelled != nullptr) always = LoadFlags(d, run.centre.unlabelled + at);
-    PoolCounts counts;
-    for (std::size_t begin = 0; begin < run.cellCount; begin += kCellsPerByte) {
-      const std::size_t end = std::min(run.cellCount, begin + kCellsPerByte);
-      for (std::size_t k = begin; k < end; ++k) {
-        const NeighbourRow& cell = run.cells[k];
-        auto pooled = near(centre, hn::LoadU(d, static_cast<const A*>(cell.labels) + at));
-        if (run.centre.unlabelled != nullptr) pooled = hn::Or(pooled, always);
-        if (cell.unlabelled != nullptr) {
-          pooled = hn::Or(pooled, LoadFlags(d, cell.unlabelled + at));
-        }
-        if (cell.excluded != nullptr) {
-          pooled = hn::AndNot(LoadFlags(d, cell.excluded + at), pooled);
-        }
-        const auto lanes = hn::VecFromMask(du, hn::RebindMask(du, pooled));
-        std::uint8_t* const to = run.flags + k * run.pitch + x;
-        if constexpr (kBytes) {
-          hn::StoreU(lanes, d8, to);
-          counts.Add(lanes);
-        } else {
-          hn::StoreU(hn::TruncateTo(d8, lanes), d8, to);
-        }
-      }
-      if constexpr (kBytes) counts.Widen();
+  std::size_t x = 0;
+  if constexpr (sizeof(A) == 1) {
+    for (; x + 2 * hn::Lanes(d) <= run.count; x += 2 * hn::Lanes(d)) {
+      FlagBytes<2>(d, run, x, near);
     }
-    if constexpr (kBytes) counts.Store(run, x);
+    for (; x < run.count; x += hn::Lanes(d)) FlagBytes<1>(d, run, x, near);
+  } else {
+    const hn::Rebind<std::uint8_t, D> d8;
+    for (; x < run.count; x += hn::Lanes(d)) {
+      const std::size_t at = run.first + x;
+      const auto centre = hn::LoadU(d, static_cast<const A*>(run.centre.labels) + at);
+      std::uint8_t* to = run.flags + x;
+      for (std::size_t k = 0; k < run.cellCount; ++k, to += run.pitch) {
+        const auto flags = FlagVector(d, run.cells[k], at, centre, run.centre.unlabelled, near);
+        hn::StoreU(hn::TruncateTo(d8, flags), d8, to);
+      }
+    }
   }
 }
 
@@ -150,6 +181,33 @@ HWY_ATTR void FlagAll(const PoolRun& run) {
   CountFlags(run);
 }
 
+HWY_ATTR bool Kept(const std::uint16_t* counts, const std::uint8_t* mask, std::size_t count,
+                   std::uint8_t* flags) {
+  const hn::ScalableTag<std::uint16_t> d;
+  const hn::Rebind<std::uint8_t, decltype(d)> d8;
+  auto any = hn::Zero(d8);
+  const auto flag = [&](std::size_t i, auto maskBytes) HWY_ATTR {
+    const auto empty = hn::VecFromMask(d, hn::Eq(hn::LoadU(d, counts + i), hn::Zero(d)));
+    const auto masked = hn::VecFromMask(d8, hn::Eq(maskBytes, hn::Zero(d8)));
+    const auto kept = hn::Or(hn::TruncateTo(d8, empty), masked);
+    hn::StoreU(kept, d8, flags + i);
+    return kept;
+  };
+  const auto ones = hn::Set(d8, 1);
+  std::size_t i = 0;
+  for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) {
+    any = hn::Or(any, flag(i, mask == nullptr ? ones : hn::LoadU(d8, mask + i)));
+  }
+  if (i < count) {
+    HWY_ALIGN std::uint8_t rest[HWY_MAX_BYTES] = {};
+    std::memset(rest, 1, count - i);
+    if (mask != nullptr) std::memcpy(rest, mask + i, count - i);
+    // What lies beyond the run does not count.
+    any = hn::Or(any, hn::IfThenElseZero(hn::FirstN(d8, count - i), flag(i, hn::Load(d8, rest))));
+  }
+  return !hn::AllTrue(d8, hn::Eq(any, hn::Zero(d8)));
+}
+
 #else
 
 // Never called: the definition takes the place of emulated vectors.
@@ -158,6 +216,7 @@ void FlagIntegers(const PoolRun&, A, A) {}
 template <typename A>
 void FlagFloats(const PoolRun&, A) {}
 void FlagAll(const PoolRun&) {}
+bool Kept(const std::uint16_t*, const std::uint8_t*, std::size_t, std::uint8_t*) { return false; }
 
 #endif
 
@@ -203,6 +262,12 @@ ZARN_FLAG_FLOATS(FlagFloat64, double)
 
 HWY_EXPORT(FlagAll);
 void FlagNeighbours(const PoolRun& run) { HWY_DYNAMIC_DISPATCH(FlagAll)(run); }
+
+HWY_EXPORT(Kept);
+bool FlagKept(const std::uint16_t* counts, const std::uint8_t* mask, std::size_t count,
+              std::uint8_t* flags) {
+  return HWY_DYNAMIC_DISPATCH(Kept)(counts, mask, count, flags);
+}
 
 }  // namespace zarn::processes::filters
 

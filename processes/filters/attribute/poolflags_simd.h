@@ -44,4 +44,9 @@ void FlagNearLabels(const PoolRun& run, A tolerance);
 /// Without labels.
 void FlagNeighbours(const PoolRun& run);
 
+/// Flags the pixels that stay as they are, because their pool is empty or their mask byte is 0, and
+/// tells whether there are any. `mask` is null or as long as `count`, without padding.
+bool FlagKept(const std::uint16_t* counts, const std::uint8_t* mask, std::size_t count,
+              std::uint8_t* flags);
+
 }  // namespace zarn::processes::filters

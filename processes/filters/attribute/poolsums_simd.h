@@ -45,21 +45,24 @@ template <class D>
 HWY_INLINE hn::Vec<D> TruncatedQuotients(D d, hn::Vec<D> sums, hn::Vec<D> counts,
                                          std::integral_constant<int, 16> /*bits*/) {
   // Float is enough: a quotient below 256 is off by up to 2^-17, and one that is no integer stays
-  // 1 / 255 below the next. Even and odd lanes apart, so that no lane changes its place.
+  // 1 / 255 below the next. Next to 2^15 the unit in the last place is 2^-8, so that adding it puts
+  // the whole part into the second byte. Even and odd lanes apart, so that no lane changes its
+  // place.
   const hn::RepartitionToWide<D> dw;
   const hn::RebindToSigned<decltype(dw)> di;
   const hn::RebindToFloat<decltype(dw)> df;
   const auto divide = [&](auto s, auto n) HWY_ATTR {
     const auto quotient =
         hn::Div(hn::ConvertTo(df, hn::BitCast(di, s)), hn::ConvertTo(df, hn::BitCast(di, n)));
-    return hn::BitCast(dw, hn::ConvertTo(di, quotient));
+    return hn::BitCast(dw, hn::Add(quotient, hn::Set(df, 32768.0F)));
   };
   const auto low = hn::Set(dw, 0xFFFF);
   const auto even =
       divide(hn::And(hn::BitCast(dw, sums), low), hn::And(hn::BitCast(dw, counts), low));
   const auto odd = divide(hn::ShiftRight<16>(hn::BitCast(dw, sums)),
                           hn::ShiftRight<16>(hn::BitCast(dw, counts)));
-  return hn::OddEven(hn::BitCast(d, hn::ShiftLeft<16>(odd)), hn::BitCast(d, even));
+  const auto whole = hn::And(hn::ShiftRight<8>(even), hn::Set(dw, 0xFF));
+  return hn::BitCast(d, hn::Or(whole, hn::And(hn::ShiftLeft<8>(odd), hn::Set(dw, 0xFF0000))));
 }
 
 /// The same of 32-bit sums below 2^31 with quotients below 2^16 and counts below 2^15.

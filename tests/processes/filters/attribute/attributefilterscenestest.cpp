@@ -19,7 +19,7 @@ TYPED_TEST_SUITE(AttributeFilterScenes, testsupport::HandledTypes, testsupport::
 
 TYPED_TEST(AttributeFilterScenes, AgreeWithTheReference) {
   const int threads = omp_get_max_threads();
-  for (std::uint64_t seed = 0; seed < 1500; ++seed) {
+  for (std::uint64_t seed = 0; seed < 700; ++seed) {
     omp_set_num_threads(1 + static_cast<int>(seed % 3));
     ASSERT_TRUE(AgreesOnAttributeScene<TypeParam>(seed));
   }
