@@ -86,7 +86,7 @@ class AttributeScene {
   void ChooseParameters() {
     parameters.algo = static_cast<processes::filters::FILTERALGO>(random_.Below(3));
     parameters.size = random_.Pick<int>({1, 2, 3, 3, 3, 3, 4, 5, 5, 5, 5, 7, 7, 9});
-    // More cells than a byte counts, and more than the ordering loops take.
+    // More cells than a byte counts.
     if (random_.Percent(3)) parameters.size = random_.Percent(30) ? 35 : 17;
     parameters.disc = random_.Percent(40);
     parameters.useNoData = random_.Percent(50);

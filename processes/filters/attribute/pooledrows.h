@@ -95,9 +95,7 @@ class PoolPlan {
   static constexpr std::size_t kFlagBytes = 16384;
 
   std::size_t MostCells() const {
-    if (algo_ == FILTERALGO::kAverage) return kMostMeanCells;
-    const bool countsInBytes = algo_ == FILTERALGO::kTrimmedMean && sizeof(T) == 1;
-    return countsInBytes ? kMostOrderedByteCells : kMostOrderedCells;
+    return algo_ == FILTERALGO::kAverage ? kMostMeanCells : kMostOrderedCells;
   }
 
   FILTERALGO algo_;

@@ -87,12 +87,14 @@ struct TakeTrimmedMeans {
   HWY_ATTR void Take(const PoolSamples& pools, std::size_t x, const Key* values) const {
     T* const results = static_cast<T*>(pools.results) + x;
     if constexpr (sizeof(T) == 1) {
-      TakeKeys<kBlock>(pools, pools.counts8 + x, values, results);
-    } else if constexpr (sizeof(T) == 2) {
-      TakeKeys<kBlock>(pools, pools.counts16 + x, values, results);
-    } else {
-      TakeDoubles<kBlock>(pools, pools.counts16 + x, values, results);
+      if (pools.cellCount <= 255) {
+        return TakeKeys<kBlock>(pools, pools.counts8 + x, values, results);
+      }
     }
+    if constexpr (sizeof(T) == 2) {
+      return TakeKeys<kBlock>(pools, pools.counts16 + x, values, results);
+    }
+    TakeDoubles<kBlock>(pools, pools.counts16 + x, values, results);
   }
 
   template <std::size_t kBlock>

@@ -32,8 +32,7 @@ struct PoolSamples {
 
 /// The most cells that the loops below take.
 inline constexpr std::size_t kMostMeanCells = 32767;
-inline constexpr std::size_t kMostOrderedCells = 1023;
-inline constexpr std::size_t kMostOrderedByteCells = 255;
+inline constexpr std::size_t kMostOrderedCells = kMostSorted;
 
 /// Means of samples `T`, as samples.
 template <typename T>
