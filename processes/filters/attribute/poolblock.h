@@ -17,7 +17,7 @@
 #include "processes/filters/framework/parallel.h"
 #include "processes/filters/framework/sampletypes.h"
 #if ZARN_SIMD
-#include "processes/filters/attribute/pooledrows.h"
+#include "processes/filters/attribute/poolband.h"
 #endif
 
 namespace zarn::processes::filters {
@@ -58,7 +58,7 @@ void RunPools(const PoolingJob<T>& job) {
         new (kAlignment) std::byte[size](), release);
     parallel::ForEachRowBand(
         rows, bands, [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
-          PooledRows<T>(job, plan, scratch.get() + static_cast<std::size_t>(band) * bytes)
+          PoolBand<T>(job, plan, scratch.get() + static_cast<std::size_t>(band) * bytes)
               .Run(begin, end);
         });
     return;
@@ -70,7 +70,7 @@ void RunPools(const PoolingJob<T>& job) {
   parallel::ForEachRowBand(
       rows, bands, [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
         const std::size_t first = static_cast<std::size_t>(band) * cells;
-        PoolRows<Statistic>(job, begin, end, pools.data() + first, samples.data() + first);
+        ReduceRows<Statistic>(job, begin, end, pools.data() + first, samples.data() + first);
       });
 }
 

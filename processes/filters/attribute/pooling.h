@@ -68,8 +68,8 @@ struct PoolingJob {
 /// `Statistic::Of` of the samples of the pool, in the order of the kernel's cells. `pool` and
 /// `samples` have room for one entry per cell.
 template <class Statistic, typename T>
-void PoolRows(const PoolingJob<T>& job, std::ptrdiff_t begin, std::ptrdiff_t end, const T** pool,
-              T* samples) {
+void ReduceRows(const PoolingJob<T>& job, std::ptrdiff_t begin, std::ptrdiff_t end, const T** pool,
+                T* samples) {
   for (std::ptrdiff_t y = begin; y < end; ++y) {
     for (std::ptrdiff_t x = 0; x < job.output.Width(); ++x) {
       if (!job.Writes(x, y)) continue;

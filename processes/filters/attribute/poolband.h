@@ -111,7 +111,7 @@ class PoolPlan {
 };
 
 /// One input row of a strip.
-struct PoolRow {
+struct HeldRow {
   std::byte* labels;
   std::uint8_t* unlabelled;
   std::uint8_t* excluded;
@@ -123,7 +123,7 @@ struct PoolRow {
 /// Scratch of one band, cut from a single allocation.
 template <typename T>
 struct PoolScratch {
-  PoolRow* rows;
+  HeldRow* rows;
   NeighbourRow* neighbours;
   const void** cells;
   T* pixels;
@@ -163,7 +163,7 @@ struct PoolScratch {
     const std::size_t pitch = plan.Pitch();
     const std::size_t segment = plan.SegmentPitch();
     PoolScratch s{};
-    s.rows = take(std::type_identity<PoolRow>(), plan.Slots());
+    s.rows = take(std::type_identity<HeldRow>(), plan.Slots());
     for (std::size_t slot = 0; slot < plan.Slots(); ++slot) {
       auto* const labels = take(std::type_identity<std::byte>(), pitch * plan.LabelSize());
       std::uint8_t* const unlabelled = take(bytes, pitch);
@@ -190,16 +190,16 @@ struct PoolScratch {
   }
 };
 
-/// The vector twin of `PoolRows`, for one band of rows. Each input row is looked at once as the
+/// The vector twin of `ReduceRows`, for one band of rows. Each input row is looked at once as the
 /// window reaches it: it is cut into channels, with its labels on the same grid beside it and flags
 /// of what is never pooled. For each run of an output row, flags then tell for every cell of the
 /// kernel which neighbours are pooled, and serve all channels.
 template <typename T>
-class PooledRows {
+class PoolBand {
  public:
   using Key = OrderedKey<T>;
 
-  PooledRows(const PoolingJob<T>& job, const PoolPlan<T>& plan, std::byte* memory)
+  PoolBand(const PoolingJob<T>& job, const PoolPlan<T>& plan, std::byte* memory)
       : job_(job), plan_(plan), scratch_(PoolScratch<T>::Take(plan, memory)) {}
 
   void Run(std::ptrdiff_t begin, std::ptrdiff_t end) {
@@ -218,13 +218,13 @@ class PooledRows {
   }
 
  private:
-  PoolRow& Held(std::ptrdiff_t y) const {
+  HeldRow& Held(std::ptrdiff_t y) const {
     return scratch_.rows[static_cast<std::size_t>(y - top_) % plan_.Slots()];
   }
 
   // Reads input row y into the place of the row that has left the window.
   void Enter(std::ptrdiff_t y) {
-    PoolRow& row = Held(y);
+    HeldRow& row = Held(y);
     const std::size_t wanted = stripWidth_ + 2 * plan_.ReachX();
     row.anyUnlabelled = false;
     row.anyExcluded = !job_.RowExists(y);
@@ -253,7 +253,7 @@ class PooledRows {
   }
 
   void ReadSamples(std::ptrdiff_t x, std::ptrdiff_t y, std::size_t lead, std::size_t count,
-                   PoolRow& row) const {
+                   HeldRow& row) const {
     const std::size_t channels = plan_.Channels();
     const std::size_t pitch = plan_.Pitch();
     // Copied, because the loops read on past the end of a row.
@@ -279,7 +279,7 @@ class PooledRows {
     }
   }
 
-  NeighbourRow NeighbourAt(const PoolRow& row, std::size_t pixel) const {
+  NeighbourRow NeighbourAt(const HeldRow& row, std::size_t pixel) const {
     return {row.labels + pixel * plan_.LabelSize(),
             row.anyUnlabelled ? row.unlabelled + pixel : nullptr,
             row.anyExcluded ? row.excluded + pixel : nullptr};
@@ -289,7 +289,7 @@ class PooledRows {
   void PoolOutputRow(std::ptrdiff_t y) {
     for (std::size_t k = 0; k < plan_.Cells(); ++k) {
       const PoolOffset& offset = job_.offsets[k];
-      const PoolRow& row = Held(y + offset.dy);
+      const HeldRow& row = Held(y + offset.dy);
       const auto pixel = static_cast<std::size_t>(job_.reach.x + offset.dx);
       scratch_.neighbours[k] = NeighbourAt(row, pixel);
       scratch_.cells[k] = row.samples + pixel * sizeof(T);
