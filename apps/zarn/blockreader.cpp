@@ -69,6 +69,15 @@ class ValidityRow {
     }
   }
 
+  void ClearNoData(const T* pixels, std::uint8_t* valid, std::size_t count) const {
+    if (input_.empty()) return;
+    for (std::size_t x = 0; x < count; ++x) {
+      if (filters::PixelNearlyEquals(pixels + x * channels_, input_.data(), channels_)) {
+        valid[x] = 0;
+      }
+    }
+  }
+
   // Excluded pixels enter no mean, so what they become can be put in their place at once.
   void TranslateInvalid(const std::uint8_t* valid, T* pixels, std::size_t count) const {
     if (!translate_) return;
@@ -121,20 +130,22 @@ struct BlockReader::Fresh {
   }
 };
 
-BlockReader::BlockReader(const RasterSource& source, MaskFile* mask, const NoDataValues& noData,
-                         std::int64_t halo)
+BlockReader::BlockReader(const RasterSource& source, const NoDataValues& noData,
+                         const BlockRequest& request)
     : source_(source),
-      mask_(mask),
       noData_(noData),
-      halo_(halo),
+      request_(request),
+      halo_(request.halo),
       sampleBytes_(source.Channels().size() * source.Type().Bytes()),
       isFloat_(GDALDataTypeIsFloating(source.Type().gdal) != FALSE),
-      needsValid_(halo > 0 || isFloat_ || mask != nullptr || !source.Alphas().empty() ||
-                  !source.Masks().empty()) {}
+      needsValid_(halo_ > 0 || isFloat_ || request.mask != nullptr || !source.Alphas().empty() ||
+                  !source.Masks().empty() || (request.marksNoData && !noData.input.empty())),
+      needsWritable_(request.outputMask != nullptr || (request.protectsInvalid && needsValid_)) {}
 
 std::size_t BlockReader::SideBytes() const {
   return source_.Alphas().size() * source_.Type().Bytes() + (source_.Masks().empty() ? 0 : 1) +
-         (needsValid_ ? 1 : 0);
+         (needsValid_ ? 1 : 0) + (needsWritable_ ? 1 : 0) +
+         (request_.labels != nullptr ? request_.labels->Bytes() : 0);
 }
 
 void BlockReader::Shape(const Window& window, WindowBuffers& buffers) const {
@@ -147,6 +158,9 @@ void BlockReader::Shape(const Window& window, WindowBuffers& buffers) const {
   buffers.fileMask.Shape(width, height, source_.Masks().empty() ? 0 : 1);
   buffers.valid.Shape(width, height, needsValid_ ? 1 : 0);
   buffers.output.Shape(window.width, window.height, sampleBytes_);
+  buffers.writable.Shape(window.width, window.height, needsWritable_ ? 1 : 0);
+  buffers.labels.Shape(width, height, request_.labels != nullptr ? request_.labels->Bytes() : 0);
+  if (request_.labels != nullptr) buffers.labelType = request_.labels->Type();
 }
 
 void BlockReader::Read(const Window& window, const WindowBuffers* above, WindowBuffers& buffers) {
@@ -157,6 +171,7 @@ void BlockReader::Read(const Window& window, const WindowBuffers* above, WindowB
     CarryRows(above->alphas, carried, buffers.alphas);
     CarryRows(above->fileMask, carried, buffers.fileMask);
     CarryRows(above->valid, carried, buffers.valid);
+    CarryRows(above->labels, carried, buffers.labels);
   }
 
   const std::int64_t left = window.x - halo_;
@@ -174,7 +189,9 @@ void BlockReader::Read(const Window& window, const WindowBuffers* above, WindowB
   ReadBands(fresh, source_.Channels(), buffers.samples);
   ReadBands(fresh, source_.Alphas(), buffers.alphas);
   ReadFileMask(fresh, buffers.fileMask);
+  ReadLabels(fresh, buffers.labels);
   MarkValid(fresh, buffers);
+  MarkWritable(buffers);
   PrepareOutput(buffers);
 }
 
@@ -225,6 +242,13 @@ void BlockReader::ReadFileMask(const Fresh& fresh, Plane& plane) {
   }
 }
 
+void BlockReader::ReadLabels(const Fresh& fresh, Plane& plane) {
+  if (!plane.Used()) return;
+  fresh.ClearOutside(plane);
+  if (fresh.inside.height == 0) return;
+  request_.labels->Read(fresh.inside, plane.At(fresh.column, fresh.row), plane.Stride());
+}
+
 void BlockReader::MarkValid(const Fresh& fresh, WindowBuffers& buffers) {
   if (!needsValid_) return;
   fresh.ClearOutside(buffers.valid);
@@ -253,17 +277,36 @@ void BlockReader::MarkValid(const Fresh& fresh, WindowBuffers& buffers) {
           valid[x] = mask[x] == std::byte{0} ? std::uint8_t{0} : valid[x];
         }
       }
+      if (request_.marksNoData) rules.ClearNoData(samples(y), valid, width);
       rules.TranslateInvalid(valid, samples(y), width);
     });
-    if (mask_ != nullptr) {
-      mask_->Exclude(fresh.inside,
-                     reinterpret_cast<std::uint8_t*>(buffers.valid.At(fresh.column, fresh.row)),
-                     buffers.valid.Stride());
+    if (request_.mask != nullptr) {
+      request_.mask->Exclude(
+          fresh.inside, reinterpret_cast<std::uint8_t*>(buffers.valid.At(fresh.column, fresh.row)),
+          buffers.valid.Stride());
       forEachRow([&](std::uint8_t* valid, std::int64_t y) {
         rules.TranslateNoData(valid, samples(y), width);
       });
     }
   });
+}
+
+void BlockReader::MarkWritable(WindowBuffers& buffers) {
+  if (!needsWritable_) return;
+  const auto width = static_cast<std::size_t>(buffers.window.width);
+  for (std::int64_t y = 0; y < buffers.window.height; ++y) {
+    std::byte* const row = buffers.writable.At(0, y);
+    if (request_.protectsInvalid && needsValid_) {
+      std::memcpy(row, buffers.valid.At(halo_, y + halo_), width);
+    } else {
+      std::fill_n(row, width, std::byte{1});
+    }
+  }
+  if (request_.outputMask != nullptr) {
+    request_.outputMask->Exclude(buffers.window,
+                                 reinterpret_cast<std::uint8_t*>(buffers.writable.Data()),
+                                 buffers.writable.Stride());
+  }
 }
 
 void BlockReader::PrepareOutput(WindowBuffers& buffers) const {
@@ -274,7 +317,10 @@ void BlockReader::PrepareOutput(WindowBuffers& buffers) const {
     const bool rowMasked =
         buffers.masked && std::memchr(valid.At(halo_, y + halo_), 0,
                                       static_cast<std::size_t>(buffers.window.width)) != nullptr;
-    if (!rowMasked && !noDataStays) continue;
+    const bool rowProtected =
+        needsWritable_ && std::memchr(buffers.writable.At(0, y), 0,
+                                      static_cast<std::size_t>(buffers.window.width)) != nullptr;
+    if (!rowMasked && !rowProtected && !noDataStays) continue;
     std::memcpy(buffers.output.At(0, y), buffers.samples.At(halo_, y + halo_),
                 buffers.output.Stride());
   }

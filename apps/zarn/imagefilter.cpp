@@ -4,14 +4,13 @@
 #include <charconv>
 #include <filesystem>
 #include <system_error>
+#include <utility>
 
 #include "apps/zarn/blockreader.h"
 #include "apps/zarn/blockwriter.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
-#include "apps/zarn/maskfile.h"
 #include "apps/zarn/progress.h"
-#include "apps/zarn/streamer.h"
 #include "host/core/exception.h"
 #include "host/sys/openmp.h"
 
@@ -40,7 +39,7 @@ std::optional<WindowSize> ParseWindow(const std::string& text) {
 }
 
 // The filter itself knows its sample types; one pixel asks it before anything is written.
-void RequireSampleType(const RasterSource& source, filters::IFilter& probe) {
+void RequireSampleType(const RasterSource& source, const WindowFilter& probe) {
   using enum gobs::NativeDataTypeCode;
   if (source.Type().code == kUnknown || source.Type().code == kNone) {
     FailFiltering(source, "Unknown sample type.");
@@ -49,7 +48,8 @@ void RequireSampleType(const RasterSource& source, filters::IFilter& probe) {
   gobs::Raster output(pixel);
   filters::FilterResult result;
   try {
-    result = probe.Process(gobs::Raster(pixel), output, 0, 0, nullptr);
+    const gobs::Raster input(pixel);
+    result = probe({input, output});
   } catch (const Exception& refusal) {
     // Filters that look their type up in a list refuse it in this way.
     result = filters::FilterResult::Failure(refusal.Message());
@@ -82,7 +82,7 @@ CLI::Validator WholeNumber(std::int64_t least, std::optional<std::int64_t> most)
 }
 
 void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
-                           const std::string& maskHelp) {
+                           const ImageFilterHelp& help) {
   const auto text = [&](const char* name, auto& value, const char* type,
                         const std::string& description) {
     return command.add_option(name, value, description)->type_name(type);
@@ -96,12 +96,14 @@ void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
   };
   text("IN", options.input, "", "Raster to filter: anything that GDAL reads")->required();
   text("OUT", options.output.target, "", "Raster to write")->required();
-  text("--src-nodata", options.srcNoData, "V[,V...]",
-       "No-data value of IN, one for all bands or one for each, or 'none'; by default the file's "
-       "own");
-  text("--dst-nodata", options.dstNoData, "V[,V...]",
-       "No-data value of OUT, given to every invalid pixel, or 'none'; by default that of IN");
-  text("--mask", options.mask, "FILE", maskHelp);
+  if (help.offersNoData) {
+    text("--src-nodata", options.srcNoData, "V[,V...]",
+         "No-data value of IN, one for all bands or one for each, or 'none'; by default the file's "
+         "own");
+    text("--dst-nodata", options.dstNoData, "V[,V...]",
+         "No-data value of OUT, given to every invalid pixel, or 'none'; by default that of IN");
+  }
+  text(help.maskOption.c_str(), options.mask, "FILE", help.maskHelp);
   text("--of", options.output.format, "FORMAT",
        "GDAL format of OUT; by default by its extension, else GTiff");
   text("--co", options.output.creation, "KEY=VALUE",
@@ -119,6 +121,15 @@ void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
   command.add_flag("-q,--quiet", options.quiet, "No progress and no warnings");
 }
 
+WindowFilter OnWindows(std::unique_ptr<filters::IFilter> filter, const NoDataValues& noData) {
+  filter->SetNoDataValues(&noData.input, &noData.output);
+  return
+      [owned = std::shared_ptr<filters::IFilter>(std::move(filter))](const WindowBlocks& blocks) {
+        return owned->Process(blocks.input, blocks.output, blocks.input.OriginX(),
+                              blocks.input.OriginY(), blocks.valid);
+      };
+}
+
 void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker) {
   if (options.quiet) SilenceWarnings();
   SetGdalThreads(options.threads);
@@ -126,11 +137,10 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
 
   const RasterSource source(options.input);
   source.RefusePalette();
-  RequireSampleType(source, *maker.probe(source));
-  const NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
+  RequireSampleType(source, maker.probe(source));
+  NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
+  if (!maker.knowsNoData) noData.input.clear();
   const FittedFilter fitted = maker.fit(source, noData);
-  filters::IFilter& filter = *fitted.filter;
-  filter.SetNoDataValues(&noData.input, &noData.output);
   std::optional<MaskFile> mask;
   if (!options.mask.empty()) {
     mask.emplace(options.mask, source);
@@ -138,7 +148,13 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
   }
 
   StagedOutput output(options.output, source, noData.output);
-  BlockReader reader(source, mask ? &*mask : nullptr, noData, fitted.halo);
+  BlockReader reader(source, noData,
+                     {.halo = fitted.halo,
+                      .mask = mask ? &*mask : nullptr,
+                      .labels = fitted.labels.get(),
+                      .outputMask = fitted.outputMask.get(),
+                      .marksNoData = fitted.marksNoData,
+                      .protectsInvalid = fitted.protectsInvalid});
   BlockWriter writer(source, output.Dataset(), output.Name());
   int blockWidth = 1;
   int blockHeight = 1;
@@ -160,9 +176,8 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
   ProgressSpan publishing(progress, output.CopiesAtTheEnd() ? 0.5 : 0.99, 1);
   StreamWindows(
       source, plan, reader,
-      [&](const gobs::Raster& input, gobs::Raster& block, const std::uint8_t* valid) {
-        const filters::FilterResult result =
-            filter.Process(input, block, input.OriginX(), input.OriginY(), valid);
+      [&](const WindowBlocks& blocks) {
+        const filters::FilterResult result = fitted.filter(blocks);
         if (!result.Ok()) FailFiltering(source, result.message);
       },
       writer, filtering);

@@ -9,8 +9,12 @@
 #include <string>
 
 #include "apps/zarn/dataset.h"
+#include "apps/zarn/labelfile.h"
+#include "apps/zarn/maskfile.h"
 #include "apps/zarn/nodata.h"
 #include "apps/zarn/stagedoutput.h"
+#include "apps/zarn/streamer.h"
+#include "processes/filters/framework/filterresult.h"
 #include "processes/filters/framework/ifilter.h"
 
 namespace zarn::app {
@@ -28,27 +32,48 @@ struct ImageFilterOptions {
   bool quiet = false;
 };
 
-/// Declares IN, OUT and the options on a subcommand; `maskHelp` says what a mask file does here.
+/// What differs between commands in the options that they share.
+struct ImageFilterHelp {
+  std::string maskHelp;  ///< what a mask file does here
+  std::string maskOption = "--mask";
+  bool offersNoData = true;  ///< whether the command knows of no-data values
+};
+
+/// Declares IN, OUT and the options on a subcommand.
 void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
-                           const std::string& maskHelp);
+                           const ImageFilterHelp& help);
 
 /// Accepts nothing but digits, within the range; numbers beyond 64 bits saturate when they are
 /// converted.
 CLI::Validator WholeNumber(std::int64_t least, std::optional<std::int64_t> most);
 
+/// Filters one window; a failure of the data comes back as its result.
+using WindowFilter = std::function<processes::filters::FilterResult(const WindowBlocks& blocks)>;
+
+/// A filter of the library that works on one block alone, with the no-data values given.
+WindowFilter OnWindows(std::unique_ptr<processes::filters::IFilter> filter,
+                       const NoDataValues& noData);
+
 /// A filter made for one image.
 struct FittedFilter {
-  std::unique_ptr<processes::filters::IFilter> filter;
+  WindowFilter filter;
   std::int64_t halo = 0;  ///< pixels that it needs around a window on every side
+  std::unique_ptr<LabelFile> labels = nullptr;     ///< read beside the image, or null
+  std::unique_ptr<MaskFile> outputMask = nullptr;  ///< names pixels to be left alone, or null
+  bool marksNoData = false;                        ///< as `BlockRequest` has it
+  bool protectsInvalid = false;                    ///< as `BlockRequest` has it
 };
 
 /// How a command makes its filter once the image is open.
 struct FilterMaker {
-  /// A filter of the same kind that needs no halo. It is asked for the image's sample type, which
-  /// the filters themselves know best, before anything is written.
-  std::function<std::unique_ptr<processes::filters::IFilter>(const RasterSource&)> probe;
-  /// The filter that does the work; its no-data values are set by the caller.
+  /// A filter of the same kind that needs no halo and no labels. It is asked for the image's sample
+  /// type, which the filters themselves know best, before anything is written.
+  std::function<WindowFilter(const RasterSource&)> probe;
+  /// The filter that does the work.
   std::function<FittedFilter(const RasterSource&, const NoDataValues&)> fit;
+  /// Whether no-data values mean anything to the filter; else they are values like all others,
+  /// and the output declares those of the input.
+  bool knowsNoData = true;
 };
 
 /// Filters the input file into the output file. Throws `UsageError` and `RunError`.

@@ -22,8 +22,10 @@
 #include "apps/zarn/interruption.h"
 #include "apps/zarn/lut.h"
 #include "apps/zarn/minmaxlut.h"
+#include "apps/zarn/morph.h"
 #include "apps/zarn/polynomial.h"
 #include "apps/zarn/sample.h"
+#include "apps/zarn/segmentfilter.h"
 
 namespace {
 
@@ -54,10 +56,12 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddGainOffsetCommand(app);
   zarn::app::AddLutCommand(app);
   zarn::app::AddMinMaxLutCommand(app);
+  zarn::app::AddMorphCommand(app);
   zarn::app::AddPolynomialCommand(app);
   zarn::app::AddDodgeCommand(app);
   zarn::app::AddHotSpotCommand(app);
   zarn::app::AddSampleCommand(app);
+  zarn::app::AddSegmentFilterCommand(app);
 }
 
 // A variable of a script that was never set must not silently stand for "not given".

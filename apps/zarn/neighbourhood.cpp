@@ -41,20 +41,21 @@ void AddNeighbourhoodOptions(CLI::App& command, NeighbourhoodOptions& options) {
       ->type_name("V");
   AddImageFilterOptions(
       command, options.image,
-      "Raster of the same size; pixels where it is 0 enter no window and stay as they are");
+      {.maskHelp =
+           "Raster of the same size; pixels where it is 0 enter no window and stay as they are"});
 }
 
 void RunNeighbourhoodFilter(const NeighbourhoodOptions& options,
                             const NeighbourhoodFilterMaker& makeFilter) {
-  RunImageFilter(options.image,
-                 {.probe = [&](const RasterSource&) { return makeFilter(1, std::nullopt); },
-                  .fit =
-                      [&](const RasterSource& source, const NoDataValues&) {
-                        const int size = ClampedSize(options.size, source);
-                        return FittedFilter{
-                            makeFilter(size, ParseBackground(options.background, source.Type())),
-                            size / 2};
-                      }});
+  RunImageFilter(
+      options.image,
+      {.probe = [&](const RasterSource&) { return OnWindows(makeFilter(1, std::nullopt), {}); },
+       .fit =
+           [&](const RasterSource& source, const NoDataValues& noData) {
+             const int size = ClampedSize(options.size, source);
+             const auto background = ParseBackground(options.background, source.Type());
+             return FittedFilter{OnWindows(makeFilter(size, background), noData), size / 2};
+           }});
 }
 
 }  // namespace zarn::app

@@ -25,9 +25,10 @@ CLI::Option& AddPointFilterOptions(CLI::App& command, PointFilterOptions& option
   command.add_flag_callback(
       "--example", [text = help.exampleFile] { PrintAndEnd(text); },
       "Print a parameter file to start from, and do nothing else");
-  AddImageFilterOptions(command, options.image,
-                        "Raster of the same size; pixels where it is 0 are not corrected and "
-                        "become the no-data value of OUT, if it has one");
+  AddImageFilterOptions(
+      command, options.image,
+      {.maskHelp = "Raster of the same size; pixels where it is 0 are not corrected and "
+                   "become the no-data value of OUT, if it has one"});
   command.footer("Parameter file, with one object for all bands or one for each:\n" + help.schema +
                  "\nPixels that are no-data, NaN, transparent (alpha 0) or masked become the "
                  "no-data value of OUT,\nor stay as they are where it has none. " +
@@ -37,11 +38,13 @@ CLI::Option& AddPointFilterOptions(CLI::App& command, PointFilterOptions& option
 
 void RunPointFilter(const ImageFilterOptions& options, const PointFilterMaker& make,
                     const PointFilterCheck& check) {
-  RunImageFilter(
-      options, {.probe = make, .fit = [&](const RasterSource& source, const NoDataValues& noData) {
-                  if (check) check(source, noData);
-                  return FittedFilter{make(source)};
-                }});
+  RunImageFilter(options,
+                 {.probe = [&](const RasterSource& source) { return OnWindows(make(source), {}); },
+                  .fit =
+                      [&](const RasterSource& source, const NoDataValues& noData) {
+                        if (check) check(source, noData);
+                        return FittedFilter{OnWindows(make(source), noData)};
+                      }});
 }
 
 }  // namespace zarn::app

@@ -11,23 +11,39 @@
 namespace zarn::app {
 namespace {
 
-gobs::RasterInfo Describe(const RasterSource& source, const Window& window, std::int64_t halo) {
+gobs::RasterInfo Describe(const Window& window, std::size_t channels, gobs::NativeDataTypeCode type,
+                          std::int64_t halo) {
   const auto margin = static_cast<std::uint32_t>(halo);
   return gobs::RasterInfo(static_cast<std::uint32_t>(window.width),
                           static_cast<std::uint32_t>(window.height),
-                          static_cast<std::uint32_t>(source.Channels().size()), source.Type().code,
+                          static_cast<std::uint32_t>(channels), type,
                           gobs::BlockFrame{margin, margin, static_cast<std::uint32_t>(window.x),
                                            static_cast<std::uint32_t>(window.y)});
 }
 
 void FilterWindow(const RasterSource& source, const BlockFunction& filter, WindowBuffers& buffers) {
+  const auto channels = source.Channels().size();
   const gobs::Raster input =
-      gobs::Raster::WrapConst(Describe(source, buffers.window, buffers.halo),
+      gobs::Raster::WrapConst(Describe(buffers.window, channels, source.Type().code, buffers.halo),
                               buffers.samples.Data(), buffers.samples.Size());
-  gobs::Raster output(Describe(source, buffers.window, 0), buffers.output.Data(),
-                      buffers.output.Size());
-  filter(input, output,
-         buffers.masked ? reinterpret_cast<const std::uint8_t*>(buffers.valid.Data()) : nullptr);
+  gobs::Raster output(Describe(buffers.window, channels, source.Type().code, 0),
+                      buffers.output.Data(), buffers.output.Size());
+  const auto bytes = [](const Plane& plane, bool wanted) {
+    return wanted ? reinterpret_cast<const std::uint8_t*>(plane.Data()) : nullptr;
+  };
+  WindowBlocks blocks{.input = input,
+                      .output = output,
+                      .valid = bytes(buffers.valid, buffers.masked),
+                      .writable = bytes(buffers.writable, buffers.writable.Used())};
+  if (!buffers.labels.Used()) {
+    filter(blocks);
+    return;
+  }
+  const gobs::Raster labels =
+      gobs::Raster::WrapConst(Describe(buffers.window, 1, buffers.labelType, buffers.halo),
+                              buffers.labels.Data(), buffers.labels.Size());
+  blocks.labels = &labels;
+  filter(blocks);
 }
 
 }  // namespace

@@ -16,10 +16,17 @@ namespace zarn::app {
 /// Windows that are in memory at a time: one being read, one filtered and one written.
 inline constexpr std::size_t kStreamSlots = 3;
 
-/// Filters one window: `input` has the margins that were planned for, `output` holds what pixels
-/// become that are left alone, `mask` is null or covers the input with its margins.
-using BlockFunction =
-    std::function<void(const gobs::Raster& input, gobs::Raster& output, const std::uint8_t* mask)>;
+/// One window as a filter sees it.
+struct WindowBlocks {
+  const gobs::Raster& input;               ///< with the margins that were planned for
+  gobs::Raster& output;                    ///< holds what pixels become that are left alone
+  const std::uint8_t* valid = nullptr;     ///< null, or covers the input with its margins
+  const gobs::Raster* labels = nullptr;    ///< null, or one label per pixel of the input
+  const std::uint8_t* writable = nullptr;  ///< null, or covers the output; 0: not to be written
+};
+
+/// Filters one window.
+using BlockFunction = std::function<void(const WindowBlocks& blocks)>;
 
 /// Takes all windows of `plan` through reader, `filter` and writer, which overlap. `filter` runs on
 /// the calling thread. The first exception of any of them is rethrown.

@@ -6,6 +6,7 @@
 #include <memory>
 
 #include "apps/zarn/windows.h"
+#include "host/gobs/datatypes.h"
 
 namespace zarn::app {
 
@@ -57,7 +58,10 @@ struct WindowBuffers {
   Plane fileMask;       ///< the file's mask as it is
   Plane valid;          ///< bytes, 0: not to be processed, or outside of the image
   bool masked = false;  ///< whether `valid` has a 0
-  Plane output;         ///< the filtered channels, without halo
+  Plane labels;         ///< the labels, one for each pixel of the image
+  gobs::NativeDataTypeCode labelType = gobs::NativeDataTypeCode::kNone;
+  Plane output;    ///< the filtered channels, without halo
+  Plane writable;  ///< bytes, without halo; 0: the output is not to be written
 };
 
 }  // namespace zarn::app

@@ -47,7 +47,8 @@ void Measure(Case& c, benchmark::State& state) {
     benchmark::ClobberMemory();
   };
   for (auto _ : state) {
-    const Turn turn{Time(c.comparison.own), Time(c.comparison.other), Time(copy)};
+    const Turn turn{Time(c.comparison.own), Time(c.comparison.other) * c.comparison.otherScale,
+                    Time(copy)};
     state.SetIterationTime(turn.own / 1000);
     c.turns.push_back(turn);
   }

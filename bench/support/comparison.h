@@ -16,6 +16,7 @@ struct Comparison {
   std::size_t blockBytes;  ///< size of the memcpy that serves as the unit
   std::function<void()> own;
   std::function<void()> other;
+  double otherScale = 1;  ///< the peer's time counts so often: it was given a part of the block
 };
 
 /// Registers the case; the functions keep what they need alive.

@@ -52,4 +52,14 @@ Refusal CheckBlocks(const gobs::Raster& input, const gobs::Raster& output,
   return {};
 }
 
+Refusal CheckSecondInput(const gobs::Raster& second, const gobs::Raster& output,
+                         std::uint32_t channels) {
+  if (second.Channels() != channels) return FilterResult::Failure(messages::kTypesDiffer);
+  if (Inconsistent(second)) return FilterResult::Failure(messages::kInconsistentBlock);
+  if (Overlap(second, output, Aliasing::kForbidden)) {
+    return FilterResult::Failure(messages::kOverlap);
+  }
+  return {};
+}
+
 }  // namespace zarn::processes::filters::blockchecks

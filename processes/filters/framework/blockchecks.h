@@ -38,5 +38,11 @@ Refusal CheckBlocks(const gobs::Raster& input, const gobs::Raster& output,
                     const std::vector<double>& inputNoData, const std::vector<double>& outputNoData,
                     Aliasing aliasing, std::size_t parameterChannels = kNoParameters);
 
+/// What is refused of an input of another type that is read beside the first one: another number
+/// of channels than `channels`, a block without data or smaller than described, and memory shared
+/// with the output.
+Refusal CheckSecondInput(const gobs::Raster& second, const gobs::Raster& output,
+                         std::uint32_t channels);
+
 }  // namespace blockchecks
 }  // namespace zarn::processes::filters

@@ -1,0 +1,27 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <cstdint>
+#include <string>
+
+#include "apps/zarn/dataset.h"
+#include "processes/filters/framework/structuringkernel.h"
+
+namespace zarn::app {
+
+/// The structuring kernel of a command.
+struct KernelOptions {
+  std::int64_t size = 3;
+  std::string shape = "square";
+
+  processes::filters::KernelShape Shape() const;
+  /// Pixels around a window that `steps` runs of the kernel, one upon the other, need; no more than
+  /// the image has.
+  std::int64_t Halo(const RasterSource& source, int steps) const;
+};
+
+/// Declares --size and --shape on a subcommand.
+void AddKernelOptions(CLI::App& command, KernelOptions& options);
+
+}  // namespace zarn::app
