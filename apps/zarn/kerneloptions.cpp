@@ -9,8 +9,13 @@ namespace zarn::app {
 
 namespace filters = processes::filters;
 
-filters::KernelShape KernelOptions::Shape() const {
-  return shape == "disc" ? filters::KernelShape::kDisc : filters::KernelShape::kSquare;
+Kernel KernelOptions::For(const RasterSource& source) const {
+  const std::int64_t side = std::max(source.Width(), source.Height());
+  const std::int64_t whole = 2 * side + 1;  // a square that sees the image from all its pixels
+  // A disc around that square sees it all as well.
+  const bool isSquare = shape != "disc" || size >= 3 * whole / 2;
+  return {static_cast<int>(isSquare ? std::min(size, whole) : size),
+          isSquare ? filters::KernelShape::kSquare : filters::KernelShape::kDisc};
 }
 
 std::int64_t KernelOptions::Halo(const RasterSource& source, int steps) const {

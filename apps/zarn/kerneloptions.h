@@ -10,12 +10,19 @@
 
 namespace zarn::app {
 
+/// What `SetupKernelSE` makes a kernel of.
+struct Kernel {
+  int size;
+  processes::filters::KernelShape shape;
+};
+
 /// The structuring kernel of a command.
 struct KernelOptions {
   std::int64_t size = 3;
   std::string shape = "square";
 
-  processes::filters::KernelShape Shape() const;
+  /// The kernel for an image, without most of the cells that lie outside of it from everywhere.
+  Kernel For(const RasterSource& source) const;
   /// Pixels around a window that `steps` runs of the kernel, one upon the other, need; no more than
   /// the image has.
   std::int64_t Halo(const RasterSource& source, int steps) const;

@@ -111,8 +111,8 @@ class RegionMorphology {
 
 class MorphFilter {
  public:
-  explicit MorphFilter(const MorphOptions& options)
-      : morphology_(Offsets(options.kernel), options.operation),
+  MorphFilter(const MorphOptions& options, const Kernel& kernel)
+      : morphology_(Offsets(kernel), options.operation),
         match_(static_cast<std::uint8_t>(options.match)),
         set_(static_cast<std::uint8_t>(options.set.value_or(options.match))),
         background_(
@@ -128,9 +128,9 @@ class MorphFilter {
   }
 
  private:
-  static std::vector<int> Offsets(const KernelOptions& kernel) {
+  static std::vector<int> Offsets(const Kernel& kernel) {
     std::vector<int> offsets;
-    filters::SetupKernelSE(static_cast<float>(kernel.size), offsets, kernel.Shape());
+    filters::SetupKernelSE(static_cast<float>(kernel.size), offsets, kernel.shape);
     return offsets;
   }
 
@@ -164,21 +164,25 @@ class MorphFilter {
   Bytes region_;
 };
 
-WindowFilter OnWindows(const MorphOptions& options) {
-  return [filter = std::make_shared<MorphFilter>(options)](const WindowBlocks& blocks) {
+WindowFilter OnWindows(const MorphOptions& options, const Kernel& kernel) {
+  return [filter = std::make_shared<MorphFilter>(options, kernel)](const WindowBlocks& blocks) {
     return filter->Process(blocks);
   };
 }
 
 void Run(const MorphOptions& options) {
-  RunImageFilter(options.image,
-                 {.probe = [&](const RasterSource&) { return OnWindows(options); },
-                  .fit =
-                      [&](const RasterSource& source, const NoDataValues&) {
-                        const int steps = options.HasTwoSteps() ? 2 : 1;
-                        return FittedFilter{OnWindows(options), options.kernel.Halo(source, steps)};
-                      },
-                  .knowsNoData = false});
+  RunImageFilter(options.image, {.probe =
+                                     [&](const RasterSource& source) {
+                                       return OnWindows(options, options.kernel.For(source));
+                                     },
+                                 .fit =
+                                     [&](const RasterSource& source, const NoDataValues&) {
+                                       const int steps = options.HasTwoSteps() ? 2 : 1;
+                                       return FittedFilter{
+                                           OnWindows(options, options.kernel.For(source)),
+                                           options.kernel.Halo(source, steps)};
+                                     },
+                                 .knowsNoData = false});
 }
 
 }  // namespace

@@ -30,12 +30,14 @@ struct SegmentFilterOptions {
 
 using FilterPtr = std::unique_ptr<filters::IAttributeFilter>;
 
-FilterPtr MakeFilter(const SegmentFilterOptions& options, int size) {
+constexpr Kernel kOnePixel{1, filters::KernelShape::kSquare};
+
+FilterPtr MakeFilter(const SegmentFilterOptions& options, const Kernel& kernel) {
   const filters::FILTERALGO algorithm = options.statistic == "mean" ? filters::FILTERALGO::kAverage
                                         : options.statistic == "median"
                                             ? filters::FILTERALGO::kMedian
                                             : filters::FILTERALGO::kTrimmedMean;
-  const filters::AttrFilterFactory factory(size, options.kernel.Shape());
+  const filters::AttrFilterFactory factory(kernel.size, kernel.shape);
   return FilterPtr(factory.GetFilter(algorithm));
 }
 
@@ -53,7 +55,7 @@ WindowFilter OnWindows(FilterPtr filter) {
 
 // The filter itself knows its types of labels; one pixel asks it.
 void RequireLabelType(const SegmentFilterOptions& options, const LabelFile& labels) {
-  const FilterPtr probe = MakeFilter(options, 1);
+  const FilterPtr probe = MakeFilter(options, kOnePixel);
   probe->useAttributes = true;
   const gobs::Raster label(gobs::RasterInfo(1, 1, 1, labels.Type()));
   const gobs::Raster input(gobs::RasterInfo(1, 1, 1, gobs::NativeDataTypeCode::kUInt8));
@@ -66,7 +68,7 @@ void RequireLabelType(const SegmentFilterOptions& options, const LabelFile& labe
 
 FittedFilter FitFilter(const SegmentFilterOptions& options, const RasterSource& source) {
   FittedFilter fitted;
-  FilterPtr filter = MakeFilter(options, static_cast<int>(options.kernel.size));
+  FilterPtr filter = MakeFilter(options, options.kernel.For(source));
   if (!options.labels.empty()) {
     fitted.labels = std::make_unique<LabelFile>(options.labels, source, options.labelNoData);
     RequireLabelType(options, *fitted.labels);
@@ -85,10 +87,11 @@ FittedFilter FitFilter(const SegmentFilterOptions& options, const RasterSource& 
 }
 
 void Run(const SegmentFilterOptions& options) {
-  RunImageFilter(options.image,
-                 {.probe = [&](const RasterSource&) { return OnWindows(MakeFilter(options, 1)); },
-                  .fit = [&](const RasterSource& source,
-                             const NoDataValues&) { return FitFilter(options, source); }});
+  RunImageFilter(
+      options.image,
+      {.probe = [&](const RasterSource&) { return OnWindows(MakeFilter(options, kOnePixel)); },
+       .fit = [&](const RasterSource& source,
+                  const NoDataValues&) { return FitFilter(options, source); }});
 }
 
 }  // namespace

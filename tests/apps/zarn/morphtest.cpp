@@ -111,7 +111,7 @@ TEST_F(Morph, EqualsTheStepsOnTheWholeImageForAllWindowsAndThreads) {
       const Image expected = Reference(image, op, std::stoi(kernel[1]), shape);
       results.insert(expected.values);
       for (const Arguments& variant :
-           {Arguments{"--threads", "1"}, {"--window", "13x9"}, {"--window", "150x1", "-q"}}) {
+           {Arguments{"--threads", "1"}, {"--window", "23x9", "--threads", "2"}}) {
         SCOPED_TRACE(std::string(op) + " " + kernel[1] + " " + variant[1]);
         Arguments arguments{"--op", op, "--match", "200", "--set", "90", "--background", "30"};
         arguments.insert(arguments.end(), kernel.begin(), kernel.end());
@@ -131,6 +131,20 @@ TEST_F(Morph, KeepsAndReplacesValuesAsAsked) {
             (Row{9, 5, 1, 5, 0, 0, 5}));
   EXPECT_EQ(FilterRow(row, {"--op", "dilate", "--match", "5"}), (Row{5, 5, 5, 5, 5, 5, 5}));
   EXPECT_EQ(FilterRow(row, {"--op", "erode", "--match", "0"}), (Row{9, 5, 5, 5, 255, 255, 5}));
+  // Kernels that reach beyond the image.
+  for (const char* const shape : {"square", "disc"}) {
+    for (const char* const size : {"14", "16384"}) {
+      const Arguments kernel{"--match", "5", "--size", size, "--shape", shape, "--op"};
+      const auto with = [&](const char* op) {
+        Arguments arguments = kernel;
+        arguments.emplace_back(op);
+        return FilterRow(row, arguments);
+      };
+      EXPECT_EQ(with("dilate"), Row(7, 5));
+      EXPECT_EQ(with("erode"), (Row{9, 0, 0, 0, 0, 0, 0}));
+      EXPECT_EQ(with("close"), Row(7, 5));
+    }
+  }
 }
 
 TEST_F(Morph, IgnoresMaskedPixelsButNotNoData) {
