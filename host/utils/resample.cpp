@@ -191,6 +191,9 @@ class Interpolator {
   const std::vector<T>& noData_;
 };
 
+// Columns that are filled together, row by row.
+constexpr std::ptrdiff_t kStrip = 512;
+
 template <typename T>
 struct Target {
   T* Pixel(std::ptrdiff_t i) const { return samples + i * channels; }
@@ -206,6 +209,14 @@ struct Target {
   std::ptrdiff_t channels;
   const std::vector<T>& noData;  ///< empty: uncovered pixels stay as they are
 };
+
+// The place asked for may lie beyond the buffer, so it is no pointer into it.
+template <typename T>
+void AskFor(const T* samples, std::ptrdiff_t index) {
+  const auto bytes = static_cast<std::uintptr_t>(index) * sizeof(T);
+  __builtin_prefetch(
+      reinterpret_cast<const void*>(reinterpret_cast<std::uintptr_t>(samples) + bytes));
+}
 
 // The pixels that positions lie in; -1 for those outside.
 ZARN_VECTORISED
@@ -228,34 +239,39 @@ class NearestRows {
   NearestRows(const Source<T>& source, const Target<T>& target)
       : source_(source), target_(target) {}
 
-  void operator()(std::ptrdiff_t row, const double* x, const double* y) {
-    for (std::ptrdiff_t begin = 0; begin < target_.width; begin += kPiece) {
-      const std::ptrdiff_t count = std::min(target_.width - begin, kPiece);
-      FindPixels(x + begin, y + begin, count, static_cast<int>(source_.width),
-                 static_cast<int>(source_.height), columns_.data(), rows_.data());
-      Copy(row * target_.width + begin, count);
-    }
+  void operator()(std::ptrdiff_t first, const double* x, const double* y, std::ptrdiff_t count,
+                  std::ptrdiff_t ahead) {
+    FindPixels(x, y, count, static_cast<int>(source_.width), static_cast<int>(source_.height),
+               columns_.data(), rows_.data());
+    Copy(first, count, ahead);
   }
 
  private:
-  static constexpr std::ptrdiff_t kPiece = 512;
-
-  void Copy(std::ptrdiff_t first, std::ptrdiff_t count) const {
-    const std::size_t bytes =
-        kBytes != 0 ? kBytes : static_cast<std::size_t>(source_.channels) * sizeof(T);
+  // Bytes may be anything to the compiler: what the loop needs stands in variables of its own.
+  void Copy(std::ptrdiff_t first, std::ptrdiff_t count, std::ptrdiff_t ahead) const {
+    const Source<T> from = source_;
+    T* const to = target_.Pixel(first);
+    const int* const columns = columns_.data();
+    const int* const rows = rows_.data();
+    const std::ptrdiff_t channels =
+        kBytes != 0 ? static_cast<std::ptrdiff_t>(kBytes / sizeof(T)) : from.channels;
+    const bool settles = target_.mask != nullptr;
     for (std::ptrdiff_t i = 0; i < count; ++i) {
-      const std::ptrdiff_t column = columns_[static_cast<std::size_t>(i)];
-      const std::ptrdiff_t row = rows_[static_cast<std::size_t>(i)];
-      const bool covered = column >= 0 && source_.IsValid(column, row);
-      if (covered) std::memcpy(target_.Pixel(first + i), source_.Pixel(column, row), bytes);
-      if (!covered || target_.mask != nullptr) target_.Settle(first + i, covered);
+      const std::ptrdiff_t index = rows[i] * from.width + columns[i];
+      if (i % 4 == 0) AskFor(from.samples, (index + ahead) * channels);
+      const bool covered = columns[i] >= 0 && (from.mask == nullptr || from.mask[index] != 0);
+      if (covered) {
+        std::memcpy(to + i * channels, from.samples + index * channels,
+                    static_cast<std::size_t>(channels) * sizeof(T));
+      }
+      if (!covered || settles) target_.Settle(first + i, covered);
     }
   }
 
   Source<T> source_;
   Target<T> target_;
-  std::array<int, kPiece> columns_;
-  std::array<int, kPiece> rows_;
+  std::array<int, kStrip> columns_{};
+  std::array<int, kStrip> rows_{};
 };
 
 /// Rows of interpolated pixels, in runs where the machine has vectors for the sample type.
@@ -274,20 +290,20 @@ class InterpolatedRows {
 #endif
   }
 
-  void operator()(std::ptrdiff_t row, const double* x, const double* y) {
-    const std::ptrdiff_t first = row * target_.width;
+  void operator()(std::ptrdiff_t first, const double* x, const double* y, std::ptrdiff_t count,
+                  [[maybe_unused]] std::ptrdiff_t ahead) {
 #if ZARN_SIMD
     if constexpr (kHasKernel) {
       if (scratch_) {
         constexpr auto kRun = static_cast<std::ptrdiff_t>(kResampleRun);
-        for (std::ptrdiff_t begin = 0; begin < target_.width; begin += kRun) {
-          FillRun(first + begin, x + begin, y + begin, std::min(target_.width - begin, kRun));
+        for (std::ptrdiff_t begin = 0; begin < count; begin += kRun) {
+          FillRun(first + begin, x + begin, y + begin, std::min(count - begin, kRun), ahead);
         }
         return;
       }
     }
 #endif
-    for (std::ptrdiff_t i = 0; i < target_.width; ++i) FillPixel(first + i, x[i], y[i]);
+    for (std::ptrdiff_t i = 0; i < count; ++i) FillPixel(first + i, x[i], y[i]);
   }
 
  private:
@@ -298,52 +314,69 @@ class InterpolatedRows {
 #if ZARN_SIMD
   static constexpr bool kHasKernel = sizeof(T) <= 4 || std::is_same_v<T, double>;
 
-  void FillRun(std::ptrdiff_t first, const double* x, const double* y, std::ptrdiff_t count) {
-    const KernelSource source{reinterpret_cast<const std::byte*>(source_.samples), source_.mask,
-                              source_.width, source_.height,
-                              static_cast<std::size_t>(source_.channels)};
+  void FillRun(std::ptrdiff_t first, const double* x, const double* y, std::ptrdiff_t count,
+               std::ptrdiff_t ahead) {
+    const KernelSource source{reinterpret_cast<const std::byte*>(source_.samples),
+                              source_.mask,
+                              source_.width,
+                              source_.height,
+                              static_cast<std::size_t>(source_.channels),
+                              ahead};
     InterpolateRun(source, cubic_, x, y, static_cast<std::size_t>(count), *scratch_, pixels_.data(),
                    states_.data());
-    const bool allDone = std::all_of(states_.begin(), states_.begin() + count,
-                                     [](RunPixel state) { return state == RunPixel::kDone; });
-    if (allDone && (target_.noData.empty() || !HasNoData(count))) {
-      std::copy_n(pixels_.data(), count * target_.channels, target_.Pixel(first));
-      if (target_.mask != nullptr) std::fill_n(target_.mask + first, count, std::uint8_t{1});
-      return;
-    }
-    for (std::ptrdiff_t i = 0; i < count; ++i) {
-      const T* const pixel = pixels_.data() + i * target_.channels;
-      switch (states_[static_cast<std::size_t>(i)]) {
-        case RunPixel::kUncovered:
+    if (!target_.noData.empty() && HasNoData(count)) LeaveNoData(count);
+    for (std::ptrdiff_t i = 0; i < count;) {
+      const std::ptrdiff_t end = EndOfState(i, count);
+      const RunPixel state = states_[static_cast<std::size_t>(i)];
+      if (state == RunPixel::kDone) {
+        std::copy(pixels_.data() + i * target_.channels, pixels_.data() + end * target_.channels,
+                  target_.Pixel(first + i));
+        if (target_.mask != nullptr)
+          std::fill(target_.mask + first + i, target_.mask + first + end, std::uint8_t{1});
+        i = end;
+      }
+      for (; i < end; ++i) {
+        if (state == RunPixel::kUncovered) {
           target_.Settle(first + i, false);
-          break;
-        case RunPixel::kDone:
-          if (!std::equal(target_.noData.begin(), target_.noData.end(), pixel) ||
-              target_.noData.empty()) {
-            std::copy_n(pixel, target_.channels, target_.Pixel(first + i));
-            target_.Settle(first + i, true);
-            break;
-          }
-          [[fallthrough]];
-        case RunPixel::kLeft:
+        } else {
           FillPixel(first + i, x[i], y[i]);
+        }
       }
     }
+  }
+
+  // The end of the pixels from i on of which the same has become.
+  std::ptrdiff_t EndOfState(std::ptrdiff_t i, std::ptrdiff_t count) const {
+    const RunPixel* const states = states_.data();
+    return std::find_if(states + i, states + count,
+                        [state = states[i]](RunPixel other) { return other != state; }) -
+           states;
   }
 
   // Whether a pixel of the run may be the no-data value, going by all samples alike.
   bool HasNoData(std::ptrdiff_t count) const {
     const T noData = target_.noData.front();
+    const T* const samples = pixels_.data();
+    const std::ptrdiff_t end = count * target_.channels;
     bool found = false;
-    for (std::ptrdiff_t i = 0; i < count * target_.channels; ++i) {
-      found |= pixels_[static_cast<std::size_t>(i)] == noData;
-    }
+    for (std::ptrdiff_t i = 0; i < end; ++i) found |= samples[i] == noData;
     return found;
+  }
+
+  // The definition moves computed pixels off the no-data value, but not those that it copies.
+  void LeaveNoData(std::ptrdiff_t count) {
+    for (std::ptrdiff_t i = 0; i < count; ++i) {
+      RunPixel& state = states_[static_cast<std::size_t>(i)];
+      if (state == RunPixel::kDone && std::equal(target_.noData.begin(), target_.noData.end(),
+                                                 pixels_.data() + i * target_.channels)) {
+        state = RunPixel::kLeft;
+      }
+    }
   }
 
   std::unique_ptr<RunScratch> scratch_;
   std::vector<T> pixels_;
-  std::array<RunPixel, kResampleRun> states_;
+  std::array<RunPixel, kResampleRun> states_{};
 #endif
 
   Source<T> source_;
@@ -352,25 +385,57 @@ class InterpolatedRows {
   Interpolator<T> interpolate_;
 };
 
-/// Fills the target by what `makeRows` makes, one for each thread.
+/// Guesses how many pixels of the source lie between what a row draws on and what a later one will,
+/// for asking for memory ahead: a turned row takes pixels from many rows, which the machine does
+/// not foresee.
+class LookAhead {
+ public:
+  explicit LookAhead(std::ptrdiff_t sourceWidth) : width_(static_cast<double>(sourceWidth)) {}
+
+  /// `x` and `y` are the position of the same pixel of every row.
+  std::ptrdiff_t operator()(double x, double y) {
+    constexpr double kRows = 4.0;
+    constexpr double kFar = 0x1p40;
+    const double index = y * width_ + x;
+    const double ahead = kRows * (index - last_);
+    last_ = index;
+    return std::abs(ahead) < kFar ? static_cast<std::ptrdiff_t>(ahead) : 0;
+  }
+
+ private:
+  double width_;
+  double last_ = 0.0;
+};
+
+/// Fills the target by what `makeRows` makes, one for each thread: strip by strip, so that what a
+/// row draws on is still in the cache when the next row does.
 template <typename T, typename MakeRows>
-void FillRows(const Target<T>& target, IBufPosTfm& transform, const MakeRows& makeRows) {
+void FillRows(const Target<T>& target, std::ptrdiff_t sourceWidth, IBufPosTfm& transform,
+              const MakeRows& makeRows) {
+  struct Worker {
+    decltype(makeRows()) fill;
+    // Vectors read beyond the end.
+    std::array<double, kStrip + 64> x{};
+    std::array<double, kStrip + 64> y{};
+  };
   const std::ptrdiff_t bands =
       transform.IsConcurrent() ? sys::parallel::BandCount(target.height) : 1;
-  // Vectors read beyond the end.
-  constexpr std::size_t kPadding = 64;
-  const std::size_t pitch = static_cast<std::size_t>(target.width) + kPadding;
-  std::vector<double> positions(2 * pitch * static_cast<std::size_t>(bands));
-  std::vector<decltype(makeRows())> rows;
-  rows.reserve(static_cast<std::size_t>(bands));
-  while (rows.size() < rows.capacity()) rows.push_back(makeRows());
+  std::vector<Worker> workers;
+  workers.reserve(static_cast<std::size_t>(bands));
+  while (workers.size() < workers.capacity()) workers.push_back({makeRows()});
   sys::parallel::ForEachRowBandRethrowing(
       target.height, bands, [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
-        double* const x = positions.data() + 2 * pitch * static_cast<std::size_t>(band);
-        double* const y = x + pitch;
-        for (std::ptrdiff_t row = begin; row < end; ++row) {
-          transform.Transform(0, static_cast<int>(row), static_cast<int>(target.width), x, y);
-          rows[static_cast<std::size_t>(band)](row, x, y);
+        auto& [fill, x, y] = workers[static_cast<std::size_t>(band)];
+        for (std::ptrdiff_t column = 0; column < target.width; column += kStrip) {
+          const std::ptrdiff_t count = std::min(target.width - column, kStrip);
+          const auto middle = static_cast<std::size_t>(count / 2);
+          LookAhead ahead(sourceWidth);
+          for (std::ptrdiff_t row = begin; row < end; ++row) {
+            transform.Transform(static_cast<int>(column), static_cast<int>(row),
+                                static_cast<int>(count), x.data(), y.data());
+            fill(row * target.width + column, x.data(), y.data(), count,
+                 ahead(x[middle], y[middle]));
+          }
         }
       });
 }
@@ -406,7 +471,7 @@ void CopyNearest(const ResampleBuffer& source, ResampleBuffer& destination, IBuf
   const Source<Bits> from = SourceOf<Bits>(source, channels);
   const Target<Bits> to = TargetOf(destination, channels, noData);
   const auto fill = [&]<std::size_t kBytes>(std::integral_constant<std::size_t, kBytes>) {
-    FillRows(to, transform, [&] { return NearestRows<Bits, kBytes>(from, to); });
+    FillRows(to, from.width, transform, [&] { return NearestRows<Bits, kBytes>(from, to); });
   };
   switch (channels) {
     case 1:
@@ -440,7 +505,7 @@ void ResampleAs(const ResampleBuffer& source, ResampleBuffer& destination, IBufP
   }
   const Source<T> from = SourceOf<T>(source, channels);
   const Target<T> to = TargetOf(destination, channels, noData);
-  FillRows(to, transform,
+  FillRows(to, from.width, transform,
            [&] { return InterpolatedRows<T>(from, to, info.method == ResampleMethod::kCubic); });
 }
 

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "host/utils/resample_simd.h"
 
+#include <hwy/cache_control.h>
+
 #include <algorithm>
 #include <cmath>
 #include <cstring>
@@ -237,18 +239,23 @@ class RunKernel {
     using Row = std::conditional_t<kTaps == 2, std::uint16_t, std::uint32_t>;
     constexpr std::uint32_t kOnes = kTaps == 2 ? 0x0101U : 0x01010101U;
     constexpr std::uint32_t kTops = kTaps == 2 ? 0x8080U : 0x80808080U;
-    for (std::size_t i = 0; i < count_; ++i) {
-      if (states_[i] != RunPixel::kDone) continue;
-      const unsigned char* from = source_.mask + scratch_.index[i];
+    const unsigned char* const mask = source_.mask;
+    const std::ptrdiff_t width = source_.width;
+    const std::uint64_t* const index = scratch_.index.data();
+    RunPixel* const states = states_;
+    const std::size_t count = count_;
+    for (std::size_t i = 0; i < count; ++i) {
+      const unsigned char* from = mask + index[i];
       std::uint32_t any = 0;
       std::uint32_t missing = 0;
-      for (std::size_t r = 0; r < kTaps; ++r, from += source_.width) {
+      for (std::size_t r = 0; r < kTaps; ++r, from += width) {
         Row row;
         std::memcpy(&row, from, sizeof(row));
         any |= row;
         missing |= (std::uint32_t{row} - kOnes) & ~std::uint32_t{row} & kTops;
       }
-      if (missing != 0) states_[i] = any != 0 ? RunPixel::kLeft : RunPixel::kUncovered;
+      if (missing == 0 || states[i] != RunPixel::kDone) continue;
+      states[i] = any != 0 ? RunPixel::kLeft : RunPixel::kUncovered;
     }
   }
 
@@ -259,9 +266,17 @@ class RunKernel {
     const std::size_t pixelBytes = PixelBytes();
     const std::size_t rowBytes = RowBytes();
     const std::size_t step = Layout::WordStep(pixelBytes);
+    const std::uint64_t* const index = scratch_.index.data();
     std::uint64_t* const words = scratch_.words.data();
-    for (std::size_t i = 0; i < count_; ++i) {
-      const std::byte* from = first + scratch_.index[i] * pixelBytes;
+    const std::size_t count = count_;
+    // It may lie beyond the source, so it is no pointer into it.
+    const auto ahead = static_cast<std::uintptr_t>(source_.ahead) * pixelBytes;
+    for (std::size_t i = 0; i < count; ++i) {
+      const std::byte* from = first + index[i] * pixelBytes;
+      if (i % 4 == 0) {
+        hwy::Prefetch(
+            reinterpret_cast<const void*>(reinterpret_cast<std::uintptr_t>(from) + ahead));
+      }
       for (std::size_t r = 0; r < kTaps; ++r, from += rowBytes) {
         for (std::size_t k = 0; k < kWords; ++k) {
           std::memcpy(words + (r * kWords + k) * kResampleRun + i, from + k * step, 8);

@@ -17,6 +17,7 @@ struct KernelSource {
   std::ptrdiff_t width;
   std::ptrdiff_t height;
   std::size_t channels;
+  std::ptrdiff_t ahead;  ///< pixels from those of a run to those that will soon be asked for
 };
 
 /// What became of a pixel of a run.
