@@ -11,6 +11,7 @@
 #include "apps/zarn/dataset.h"
 #include "apps/zarn/nodata.h"
 #include "apps/zarn/stagedoutput.h"
+#include "apps/zarn/windows.h"
 #include "processes/filters/framework/ifilter.h"
 
 namespace zarn::app {
@@ -35,6 +36,11 @@ void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
 /// Accepts nothing but digits, within the range; numbers beyond 64 bits saturate when they are
 /// converted.
 CLI::Validator WholeNumber(std::int64_t least, std::optional<std::int64_t> most);
+
+/// The size that `--window` asks for, if any; throws `UsageError`.
+std::optional<WindowSize> ParseWindow(const std::string& text);
+/// Throws `UsageError` when the output would replace the mask.
+void RefuseMaskAsOutput(const ImageFilterOptions& options);
 
 /// A filter made for one image.
 struct FittedFilter {

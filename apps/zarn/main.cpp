@@ -23,7 +23,9 @@
 #include "apps/zarn/lut.h"
 #include "apps/zarn/minmaxlut.h"
 #include "apps/zarn/polynomial.h"
+#include "apps/zarn/resample.h"
 #include "apps/zarn/sample.h"
+#include "apps/zarn/shift.h"
 
 namespace {
 
@@ -57,6 +59,8 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddPolynomialCommand(app);
   zarn::app::AddDodgeCommand(app);
   zarn::app::AddHotSpotCommand(app);
+  zarn::app::AddResampleCommand(app);
+  zarn::app::AddShiftCommand(app);
   zarn::app::AddSampleCommand(app);
 }
 

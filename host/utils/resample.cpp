@@ -394,7 +394,7 @@ class LookAhead {
 
   /// `x` and `y` are the position of the same pixel of every row.
   std::ptrdiff_t operator()(double x, double y) {
-    constexpr double kRows = 4.0;
+    constexpr double kRows = 2.0;
     constexpr double kFar = 0x1p40;
     const double index = y * width_ + x;
     const double ahead = kRows * (index - last_);
