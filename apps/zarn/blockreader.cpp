@@ -9,10 +9,10 @@
 #include <string>
 #include <type_traits>
 
+#include "apps/zarn/anysampletype.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
 #include "processes/filters/framework/nodata.h"
-#include "processes/filters/framework/sampletypes.h"
 
 namespace zarn::app {
 namespace {
@@ -23,23 +23,6 @@ namespace filters = processes::filters;
 void CarryRows(const Plane& above, std::int64_t rows, Plane& plane) {
   const std::size_t bytes = static_cast<std::size_t>(rows) * plane.Stride();
   if (bytes > 0) std::memcpy(plane.Data(), above.Data() + above.Size() - bytes, bytes);
-}
-
-// Some filters handle 64-bit integers beside the types of `VisitSampleType`; what no filter handles
-// has been refused before.
-template <typename Visitor>
-void VisitAnySampleType(gobs::NativeDataTypeCode code, const Visitor& visit) {
-  using enum gobs::NativeDataTypeCode;
-  if (code == kInt64) {
-    visit(std::type_identity<std::int64_t>{});
-  } else if (code == kUInt64) {
-    visit(std::type_identity<std::uint64_t>{});
-  } else {
-    filters::VisitSampleType(code, "", [&](auto type) {
-      visit(type);
-      return filters::FilterResult::Success();
-    });
-  }
 }
 
 // The rules for one row of pixels; a NaN or an excluded pixel is one as a whole.

@@ -4,6 +4,7 @@
 #include <cpl_string.h>
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <cstdint>
 #include <sstream>
@@ -22,10 +23,17 @@ void CopyGeoreference(GDALDataset& source, GDALDataset& output) {
   if (source.GetGeoTransform(transform) == CE_None) output.SetGeoTransform(transform);
 }
 
-void CopyMetadata(GDALDataset& source, GDALDataset& output) {
+void Place(const OutputGrid& grid, GDALDataset& output) {
+  std::array<double, 6> transform = grid.transform;
+  if (!grid.crs.IsEmpty()) output.SetSpatialRef(&grid.crs);
+  output.SetGeoTransform(transform.data());
+}
+
+void CopyMetadata(GDALDataset& source, GDALDataset& output, bool placing) {
   CPLStringList general(CSLDuplicate(source.GetMetadata()));
   general.SetNameValue("NODATA_VALUES", nullptr);
   if (!general.empty()) output.SetMetadata(general.List());
+  if (!placing) return;
   for (const char* const domain : {"RPC", "GEOLOCATION"}) {
     char** const items = source.GetMetadata(domain);
     if (items != nullptr) output.SetMetadata(items, domain);
@@ -94,14 +102,19 @@ void DeclareNoData(const RasterSource& source, const std::vector<double>& values
 
 }  // namespace
 
-void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output) {
+void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output,
+               const OutputGrid* grid, bool masked) {
   for (int number = 1; number <= output.GetRasterCount(); ++number) {
     CopyBand(*source.Dataset().GetRasterBand(number), *output.GetRasterBand(number));
   }
-  CopyMetadata(source.Dataset(), output);
-  CopyGeoreference(source.Dataset(), output);
+  CopyMetadata(source.Dataset(), output, grid == nullptr);
+  if (grid == nullptr) {
+    CopyGeoreference(source.Dataset(), output);
+  } else {
+    Place(*grid, output);
+  }
   DeclareNoData(source, noData, output);
-  if (!source.Masks().empty()) output.CreateMaskBand(GMF_PER_DATASET);
+  if (masked || !source.Masks().empty()) output.CreateMaskBand(GMF_PER_DATASET);
 }
 
 }  // namespace zarn::app

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "apps/zarn/dataset.h"
+#include "apps/zarn/outputgrid.h"
 
 namespace zarn::app {
 
@@ -13,6 +14,10 @@ namespace zarn::app {
 /// band descriptions, colours and mask band of `source`, and declares `noData` (one value per
 /// channel, or none). To be done before the first pixel is written, because formats place it all in
 /// front of the pixels.
-void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output);
+///
+/// With `grid` the output lies on it; what places the pixels of `source` is not carried over then.
+/// `masked` gives it a mask band even if the source has none.
+void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output,
+               const OutputGrid* grid = nullptr, bool masked = false);
 
 }  // namespace zarn::app

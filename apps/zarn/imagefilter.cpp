@@ -19,19 +19,6 @@ namespace {
 
 namespace filters = processes::filters;
 
-std::optional<WindowSize> ParseWindow(const std::string& text) {
-  if (text.empty()) return std::nullopt;
-  WindowSize size;
-  const char* const end = text.data() + text.size();
-  const auto [cross, error] = std::from_chars(text.data(), end, size.width);
-  if (error == std::errc() && cross != end && *cross == 'x') {
-    const auto [rest, rowError] = std::from_chars(cross + 1, end, size.height);
-    const bool positive = size.width > 0 && size.height > 0;
-    if (rowError == std::errc() && rest == end && positive) return size;
-  }
-  throw UsageError("--window: '" + text + "' is not of the form COLSxROWS, for example 512x256");
-}
-
 [[noreturn]] void FailFiltering(const RasterSource& source, const std::string& reason) {
   throw RunError("cannot filter " + source.Name() + ": band " +
                  std::to_string(source.Channels().front()) + " is " + source.Type().Name() + ": " +
@@ -57,6 +44,21 @@ void RequireSampleType(const RasterSource& source, const WindowFilter& probe) {
   if (!result.Ok()) FailFiltering(source, result.message);
 }
 
+}  // namespace
+
+std::optional<WindowSize> ParseWindow(const std::string& text) {
+  if (text.empty()) return std::nullopt;
+  WindowSize size;
+  const char* const end = text.data() + text.size();
+  const auto [cross, error] = std::from_chars(text.data(), end, size.width);
+  if (error == std::errc() && cross != end && *cross == 'x') {
+    const auto [rest, rowError] = std::from_chars(cross + 1, end, size.height);
+    const bool positive = size.width > 0 && size.height > 0;
+    if (rowError == std::errc() && rest == end && positive) return size;
+  }
+  throw UsageError("--window: '" + text + "' is not of the form COLSxROWS, for example 512x256");
+}
+
 void RefuseMaskAsOutput(const ImageFilterOptions& options) {
   std::error_code error;
   if (std::filesystem::equivalent(options.mask, options.output.target, error)) {
@@ -64,8 +66,6 @@ void RefuseMaskAsOutput(const ImageFilterOptions& options) {
                      " is the mask file; name another output");
   }
 }
-
-}  // namespace
 
 CLI::Validator WholeNumber(std::int64_t least, std::optional<std::int64_t> most) {
   const std::string range = most ? " from " + std::to_string(least) + " to " + std::to_string(*most)

@@ -14,6 +14,7 @@
 #include "apps/zarn/nodata.h"
 #include "apps/zarn/stagedoutput.h"
 #include "apps/zarn/streamer.h"
+#include "apps/zarn/windows.h"
 #include "processes/filters/framework/filterresult.h"
 #include "processes/filters/framework/ifilter.h"
 
@@ -53,6 +54,11 @@ using WindowFilter = std::function<processes::filters::FilterResult(const Window
 /// A filter of the library that works on one block alone, with the no-data values given.
 WindowFilter OnWindows(std::unique_ptr<processes::filters::IFilter> filter,
                        const NoDataValues& noData);
+
+/// The size that `--window` asks for, if any; throws `UsageError`.
+std::optional<WindowSize> ParseWindow(const std::string& text);
+/// Throws `UsageError` when the output would replace the mask.
+void RefuseMaskAsOutput(const ImageFilterOptions& options);
 
 /// A filter made for one image.
 struct FittedFilter {

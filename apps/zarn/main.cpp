@@ -24,8 +24,10 @@
 #include "apps/zarn/minmaxlut.h"
 #include "apps/zarn/morph.h"
 #include "apps/zarn/polynomial.h"
+#include "apps/zarn/resample.h"
 #include "apps/zarn/sample.h"
 #include "apps/zarn/segmentfilter.h"
+#include "apps/zarn/shift.h"
 
 namespace {
 
@@ -60,6 +62,8 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddPolynomialCommand(app);
   zarn::app::AddDodgeCommand(app);
   zarn::app::AddHotSpotCommand(app);
+  zarn::app::AddResampleCommand(app);
+  zarn::app::AddShiftCommand(app);
   zarn::app::AddSampleCommand(app);
   zarn::app::AddSegmentFilterCommand(app);
 }

@@ -93,17 +93,17 @@ void CloseChecked(DatasetPtr dataset, const std::string& name) {
 }
 
 StagedOutput::StagedOutput(const OutputOptions& options, const RasterSource& like,
-                           const std::vector<double>& noData)
+                           const std::vector<double>& noData, const OutputGrid* grid, bool masked)
     : format_(options.format, TargetBesideInputs(options.target), options.creation),
       staging_(options.target, options.overwrite) {
   RenameInMessages(staging_.StagedFile().string(), Name());
   RenameInMessages(staging_.Scratch().string(), Name());
   format_.RequireSamples(like.Type());
-  Create(like);
-  CarryOver(like, noData, *dataset_);
+  Create(like, grid);
+  CarryOver(like, noData, *dataset_, grid, masked);
 }
 
-void StagedOutput::Create(const RasterSource& like) {
+void StagedOutput::Create(const RasterSource& like, const OutputGrid* grid) {
   const bool direct = format_.WritesBlocks();
   options_ = format_.OptionsFor(like);
   GDALDriver& driver =
@@ -111,7 +111,8 @@ void StagedOutput::Create(const RasterSource& like) {
   CPLStringList options = direct ? options_ : OutputFormat::ScratchOptionsFor(like);
   const fs::path file = direct ? staging_.StagedFile() : staging_.Scratch();
   CPLErrorReset();
-  dataset_.reset(driver.Create(file.c_str(), like.Width(), like.Height(),
+  dataset_.reset(driver.Create(file.c_str(), grid != nullptr ? grid->width : like.Width(),
+                               grid != nullptr ? grid->height : like.Height(),
                                like.Dataset().GetRasterCount(), like.Type().gdal, options.List()));
   if (!dataset_) FailWriting(Name(), LastGdalMessage(Name()));
 }

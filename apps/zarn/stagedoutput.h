@@ -9,6 +9,7 @@
 
 #include "apps/zarn/dataset.h"
 #include "apps/zarn/outputformat.h"
+#include "apps/zarn/outputgrid.h"
 #include "apps/zarn/stagingfolder.h"
 #include "host/nspio/counter.h"
 
@@ -21,14 +22,16 @@ struct OutputOptions {
   bool overwrite = false;
 };
 
-/// An output raster with the size and bands of a source. It is written in a temporary place and
-/// appears at its target, whole, with `Publish`; destroyed before that it leaves no trace.
+/// An output raster with the bands of a source and its size, or on a grid of its own. It is written
+/// in a temporary place and appears at its target, whole, with `Publish`; destroyed before that it
+/// leaves no trace.
 class StagedOutput {
  public:
-  /// Throws `UsageError` when the target or a file that goes with it is a file of a raster that is
-  /// open, `RunError` when it cannot be written.
+  /// For `grid` and `masked` see `CarryOver`. Throws `UsageError` when the target or a file that
+  /// goes with it is a file of a raster that is open, `RunError` when it cannot be written.
   StagedOutput(const OutputOptions& options, const RasterSource& like,
-               const std::vector<double>& noData);
+               const std::vector<double>& noData, const OutputGrid* grid = nullptr,
+               bool masked = false);
 
   /// The raster to write to.
   GDALDataset& Dataset() { return *dataset_; }
@@ -42,7 +45,7 @@ class StagedOutput {
   void Publish(nspio::Counter& progress);
 
  private:
-  void Create(const RasterSource& like);
+  void Create(const RasterSource& like, const OutputGrid* grid);
   void CopyToFormat(nspio::Counter& progress);
 
   OutputFormat format_;

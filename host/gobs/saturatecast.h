@@ -24,4 +24,15 @@ constexpr T SaturateCast(double value) {
   }
 }
 
+/// A value that somebody wrote down, as a sample: integers are rounded half away from zero and
+/// clamped to the type (NaN becomes 0); floating types narrow.
+template <typename T>
+constexpr T RoundToSample(double value) {
+  if constexpr (std::is_floating_point_v<T>) {
+    return SaturateCast<T>(value);
+  } else {
+    return SaturateCast<T>(value >= 0 ? value + 0.5 : value - 0.5);
+  }
+}
+
 }  // namespace zarn::gobs

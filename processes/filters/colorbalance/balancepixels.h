@@ -11,6 +11,7 @@
 
 #include "host/sys/openmp.h"
 #include "processes/filters/colorbalance/balancejob.h"
+#include "processes/filters/framework/includedpixels.h"
 #include "processes/filters/framework/parallel.h"
 #if ZARN_SIMD
 #include "processes/filters/framework/samplerows_simd.h"

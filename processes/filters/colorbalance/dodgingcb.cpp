@@ -9,6 +9,7 @@
 #include "host/sys/vectorised.h"
 #include "processes/filters/colorbalance/balanceblock.h"
 #include "processes/filters/framework/extendtypedispatch.h"
+#include "processes/filters/framework/includedpixels.h"
 
 namespace zarn::processes::filters {
 namespace {

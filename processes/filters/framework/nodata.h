@@ -12,16 +12,8 @@
 
 namespace zarn::processes::filters {
 
-/// One entry of a no-data list as a sample: integers are rounded half away from zero and clamped to
-/// the type (NaN becomes 0); floating types narrow.
-template <typename T>
-T RoundToSample(double value) {
-  if constexpr (std::is_floating_point_v<T>) {
-    return gobs::SaturateCast<T>(value);
-  } else {
-    return gobs::SaturateCast<T>(value >= 0 ? value + 0.5 : value - 0.5);
-  }
-}
+/// One entry of a no-data list as a sample.
+using gobs::RoundToSample;
 
 /// A background value as a sample: truncated towards zero and saturated.
 template <typename T>

@@ -205,7 +205,8 @@ TEST(ColorBalance, FactoriesCopyTheirTables) {
   LUTCBFactory factory({table.data()});
   const MinMaxLUTCBFactory ranges({table.data()}, {0}, {255});
   LUTCBFactory copy(factory);
-  copy = copy;  // NOLINT(clang-diagnostic-self-assign-overloaded): that is what is tested
+  const LUTCBFactory& itself = copy;
+  copy = itself;
   const std::unique_ptr<IFilter> filter(copy.GetCPUFilter());
   const std::unique_ptr<IFilter> ranged(ranges.GetCPUFilter());
   table.fill(1);

@@ -1,0 +1,304 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/regrid.h"
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstring>
+#include <limits>
+#include <optional>
+#include <string>
+
+#include "apps/zarn/anysampletype.h"
+#include "apps/zarn/blockreader.h"
+#include "apps/zarn/blockwriter.h"
+#include "apps/zarn/errors.h"
+#include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/maskfile.h"
+#include "apps/zarn/pipeline.h"
+#include "apps/zarn/progress.h"
+#include "apps/zarn/streamer.h"
+#include "host/core/exception.h"
+#include "host/sys/openmp.h"
+#include "processes/filters/framework/nodata.h"
+
+namespace zarn::app {
+namespace {
+
+namespace filters = processes::filters;
+
+// Larger windows gain nothing; a turned image draws on more of the source the wider they are.
+constexpr std::int64_t kLargestSide = 1024;
+
+std::int64_t Pixels(const Window& window) { return window.width * window.height; }
+
+/// Marks the pixels that have the no-data value.
+class NoDataMarker {
+ public:
+  NoDataMarker(const RasterSource& source, const std::vector<double>& noData) {
+    if (noData.empty()) return;
+    VisitAnySampleType(source.Type().code, [&]<typename T>(std::type_identity<T>) {
+      mark_ = [value = filters::ConvertNoData<T>(noData)](const Plane& samples, Plane& valid) {
+        const auto* pixel = reinterpret_cast<const T*>(samples.Data());
+        for (std::size_t i = 0; i < valid.Size(); ++i, pixel += value.size()) {
+          if (filters::PixelNearlyEquals(pixel, value.data(), value.size())) {
+            valid.Data()[i] = std::byte{0};
+          }
+        }
+      };
+    });
+  }
+
+  explicit operator bool() const { return static_cast<bool>(mark_); }
+  void operator()(const Plane& samples, Plane& valid) const { mark_(samples, valid); }
+
+ private:
+  std::function<void(const Plane&, Plane&)> mark_;
+};
+
+/// Windows of the source with a mask of the pixels that count.
+class SourceReader {
+ public:
+  SourceReader(const RasterSource& source, MaskFile* mask, const NoDataValues& noData)
+      : reader_(source, mask, noData, 0), isNoData_(source, noData.input) {}
+
+  std::size_t BytesPerPixel() const {
+    return 2 * reader_.SampleBytes() + reader_.SideBytes() + (isNoData_ ? 1 : 0);
+  }
+
+  void Read(const Window& window, WindowBuffers& buffers) {
+    reader_.Read(window, nullptr, buffers);
+    if (!isNoData_) return;
+    if (!buffers.valid.Used()) {
+      buffers.valid.Shape(window.width, window.height, 1);
+      std::fill_n(buffers.valid.Data(), buffers.valid.Size(), std::byte{1});
+    }
+    isNoData_(buffers.samples, buffers.valid);
+    buffers.masked = std::memchr(buffers.valid.Data(), 0, buffers.valid.Size()) != nullptr;
+  }
+
+ private:
+  BlockReader reader_;
+  NoDataMarker isNoData_;
+};
+
+/// One window of the output on its way.
+struct Slot {
+  std::unique_ptr<PixelMover> mover;
+  WindowBuffers source;
+  WindowBuffers result;
+  Plane covered;
+  bool filled = false;  ///< already while it was read, in parts
+};
+
+class Regridder {
+ public:
+  Regridder(const RasterSource& source, const Regridding& plan, const NoDataValues& noData,
+            SourceReader& reader, std::int64_t mostSourcePixels)
+      : source_(source),
+        noData_(noData.output),
+        reader_(reader),
+        mostSourcePixels_(mostSourcePixels),
+        writesMask_(MasksUncovered(source, noData)) {
+    for (Slot& slot : slots_) slot.mover = plan.makeMover();
+  }
+
+  /// Whether only a mask can tell covered pixels from uncovered ones.
+  static bool MasksUncovered(const RasterSource& source, const NoDataValues& noData) {
+    return !source.Masks().empty() || (noData.output.empty() && source.Alphas().empty());
+  }
+
+  void Stream(const WindowPlan& plan, BlockWriter& writer, nspio::Counter& progress) {
+    const Stage read = [&](std::size_t index, std::size_t slot) {
+      Read(plan.At(index), slots_[slot]);
+    };
+    const Stage move = [&](std::size_t, std::size_t slot) {
+      if (!slots_[slot].filled) Fill(slots_[slot], slots_[slot].result.window);
+    };
+    const Stage write = [&](std::size_t index, std::size_t slot) {
+      writer.Write(slots_[slot].result);
+      progress.Update(static_cast<double>(index + 1) / static_cast<double>(plan.Count()));
+    };
+    RunPipeline(plan.Count(), kStreamSlots, {read, move, write}, 1);
+  }
+
+ private:
+  void Read(const Window& window, Slot& slot) {
+    Shape(window, slot);
+    slot.mover->Enter(window);
+    slot.filled = !Fits(slot.mover->SourceOf(window));
+    if (slot.filled) {
+      FillInParts(slot, window);
+    } else {
+      ReadSource(slot, window);
+    }
+  }
+
+  bool Fits(const Window& source) const { return Pixels(source) <= mostSourcePixels_; }
+
+  void Shape(const Window& window, Slot& slot) const {
+    const std::size_t bytes = source_.Type().Bytes();
+    WindowBuffers& result = slot.result;
+    result.window = window;
+    result.output.Shape(window.width, window.height, source_.Channels().size() * bytes);
+    result.alphas.Shape(window.width, window.height, source_.Alphas().size() * bytes);
+    result.fileMask.Shape(window.width, window.height, writesMask_ ? 1 : 0);
+    slot.covered.Shape(window.width, window.height, 1);
+    if (noData_.empty()) std::fill_n(result.output.Data(), result.output.Size(), std::byte{0});
+  }
+
+  void ReadSource(Slot& slot, const Window& part) {
+    const Window needed = slot.mover->SourceOf(part);
+    if (Pixels(needed) > 0) {
+      reader_.Read(needed, slot.source);
+    } else {
+      slot.source.window = needed;
+      slot.source.masked = false;
+    }
+  }
+
+  // Rows first: the parts of a window have to lie together in memory.
+  void FillInParts(Slot& slot, const Window& part) {
+    if (Fits(slot.mover->SourceOf(part)) || Pixels(part) == 1) {
+      ReadSource(slot, part);
+      Fill(slot, part);
+      return;
+    }
+    Window first = part;
+    Window second = part;
+    if (part.height > 1) {
+      first.height /= 2;
+      second.y += first.height;
+      second.height -= first.height;
+    } else {
+      first.width /= 2;
+      second.x += first.width;
+      second.width -= first.width;
+    }
+    FillInParts(slot, first);
+    FillInParts(slot, second);
+  }
+
+  gobs::Raster Block(const Window& window, const std::vector<int>& bands, Plane& plane,
+                     const Window& planes) const {
+    const gobs::RasterInfo info(static_cast<std::uint32_t>(window.width),
+                                static_cast<std::uint32_t>(window.height),
+                                static_cast<std::uint32_t>(bands.size()), source_.Type().code,
+                                {.marginX = 0,
+                                 .marginY = 0,
+                                 .originX = static_cast<std::uint32_t>(window.x),
+                                 .originY = static_cast<std::uint32_t>(window.y)});
+    if (Pixels(window) == 0) return gobs::Raster(info, nullptr, 0);
+    return gobs::Raster(info, plane.At(window.x - planes.x, window.y - planes.y),
+                        info.DescribedSize());
+  }
+
+  void Fill(Slot& slot, const Window& part) const {
+    WindowBuffers& from = slot.source;
+    WindowBuffers& to = slot.result;
+    const auto* const mask =
+        from.masked ? reinterpret_cast<const std::uint8_t*>(from.valid.Data()) : nullptr;
+    std::byte* const covered = slot.covered.At(part.x - to.window.x, part.y - to.window.y);
+    const auto move = [&](const std::vector<int>& bands, Plane& source, Plane& output,
+                          const std::vector<double>& fill) {
+      const gobs::Raster input = Block(from.window, bands, source, from.window);
+      gobs::Raster block = Block(part, bands, output, to.window);
+      slot.mover->Move(input, mask, fill, block, reinterpret_cast<std::uint8_t*>(covered));
+    };
+    if (to.alphas.Used()) {
+      move(source_.Alphas(), from.alphas, to.alphas,
+           std::vector<double>(source_.Alphas().size(), 0.0));
+    }
+    move(source_.Channels(), from.samples, to.output, noData_);
+    if (to.fileMask.Used()) {
+      std::transform(covered, covered + Pixels(part),
+                     to.fileMask.At(part.x - to.window.x, part.y - to.window.y),
+                     [](std::byte flag) { return flag == std::byte{0} ? flag : std::byte{255}; });
+    }
+  }
+
+  const RasterSource& source_;
+  const std::vector<double>& noData_;
+  SourceReader& reader_;
+  std::int64_t mostSourcePixels_;
+  bool writesMask_;
+  std::array<Slot, kStreamSlots> slots_;
+};
+
+void RequireKnownType(const RasterSource& source) {
+  using enum gobs::NativeDataTypeCode;
+  if (source.Type().code != kUnknown && source.Type().code != kNone) return;
+  throw RunError("cannot resample " + source.Name() + ": band " +
+                 std::to_string(source.Channels().front()) + " is " + source.Type().Name() +
+                 ": Unknown sample type.");
+}
+
+// A third of the memory for what belongs to the output, the rest for the source.
+WindowSize ChooseWindow(double bytes, double bytesPerPixel) {
+  const auto side = static_cast<std::int64_t>(std::sqrt(bytes / 3 / bytesPerPixel));
+  const std::int64_t unit = side >= 256 ? 256 : 16;
+  const std::int64_t rounded = std::clamp<std::int64_t>(side / unit * unit, 16, kLargestSide);
+  return {rounded, rounded};
+}
+
+}  // namespace
+
+void RunRegridding(const ImageFilterOptions& options,
+                   const std::function<Regridding(const RasterSource&)>& fit) {
+  if (options.quiet) SilenceWarnings();
+  SetGdalThreads(options.threads);
+  const std::optional<WindowSize> forcedWindow = ParseWindow(options.window);
+
+  const RasterSource source(options.input);
+  source.RefusePalette();
+  RequireKnownType(source);
+  const NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
+  std::optional<MaskFile> mask;
+  if (!options.mask.empty()) {
+    mask.emplace(options.mask, source);
+    RefuseMaskAsOutput(options);
+  }
+  const Regridding regridding = fit(source);
+
+  StagedOutput output(options.output, source, noData.output,
+                      regridding.grid ? &*regridding.grid : nullptr,
+                      Regridder::MasksUncovered(source, noData));
+  SourceReader reader(source, mask ? &*mask : nullptr, noData);
+  BlockWriter writer(source, output.Dataset(), output.Name());
+  int blockWidth = 1;
+  int blockHeight = 1;
+  output.Dataset().GetRasterBand(1)->GetBlockSize(&blockWidth, &blockHeight);
+  const std::size_t bandBytes =
+      static_cast<std::size_t>(source.Dataset().GetRasterCount()) * source.Type().Bytes();
+  const std::size_t sideBytes = regridding.bytesPerPixel + 2;
+  const double memory = static_cast<double>(options.memory) * (1 << 20);
+  const double slotBytes = memory / kStreamSlots;
+  const WindowSize window =
+      forcedWindow.value_or(ChooseWindow(slotBytes, static_cast<double>(bandBytes + sideBytes)));
+  const WindowPlan plan(
+      {.image = {output.Dataset().GetRasterXSize(), output.Dataset().GetRasterYSize()},
+       .outputBlock = {blockWidth, blockHeight},
+       .halo = 0,
+       .sampleBytes = bandBytes,
+       .sideBytes = sideBytes,
+       .slots = kStreamSlots,
+       .memory = static_cast<std::size_t>(memory),
+       .forced = window});
+  FitBlockCache(source, plan, 0);
+  // What a block can hold at most bounds it too.
+  const double mostSourceBytes =
+      std::min<double>(slotBytes * 2 / 3, std::numeric_limits<std::uint32_t>::max());
+  Regridder regridder(
+      source, regridding, noData, reader,
+      static_cast<std::int64_t>(mostSourceBytes / static_cast<double>(reader.BytesPerPixel())));
+
+  const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
+                                                        : sys::OMPGetMaxThreads());
+  TerminalProgress progress(options.quiet);
+  ProgressSpan moving(progress, 0, output.CopiesAtTheEnd() ? 0.5 : 0.99);
+  ProgressSpan publishing(progress, output.CopiesAtTheEnd() ? 0.5 : 0.99, 1);
+  regridder.Stream(plan, writer, moving);
+  output.Publish(publishing);
+}
+
+}  // namespace zarn::app

@@ -1,0 +1,11 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace zarn::app {
+
+/// Adds the command `resample` to the program.
+void AddResampleCommand(CLI::App& app);
+
+}  // namespace zarn::app

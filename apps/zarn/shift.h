@@ -1,0 +1,11 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace zarn::app {
+
+/// Adds the command `shift` to the program.
+void AddShiftCommand(CLI::App& app);
+
+}  // namespace zarn::app
