@@ -84,10 +84,10 @@ PositionField::Lattice PositionField::Evaluate(std::int64_t left, std::int64_t t
   return lattice;
 }
 
-bool PositionField::IsFlat(const Lattice& lattice, const Square& s) const {
-  const std::int64_t half = s.side / 2;
+bool PositionField::IsFlat(const Lattice& lattice, const Square& square) const {
+  const std::int64_t half = square.side / 2;
   const auto at = [&](std::int64_t i, std::int64_t j) -> const Place& {
-    return lattice.At(s.left + i * half, s.top + j * half);
+    return lattice.At(square.left + i * half, square.top + j * half);
   };
   int existing = 0;
   double error = 0;
@@ -101,44 +101,45 @@ bool PositionField::IsFlat(const Lattice& lattice, const Square& s) const {
       error = std::max(error, std::abs(guess.x - truth.x) + std::abs(guess.y - truth.y));
     }
   }
-  if (existing == 0) return s.side <= kSurelyOutside;
+  if (existing == 0) return square.side <= kSurelyOutside;
   return existing == 9 && threshold_ > 0 && error <= threshold_;
 }
 
-void PositionField::FillPatch(const Lattice& lattice, const Square& s, const Window& window,
+void PositionField::FillPatch(const Lattice& lattice, const Square& square, const Window& window,
                               double* x, double* y) {
-  const std::int64_t left = std::max(s.left, window.x);
-  const std::int64_t top = std::max(s.top, window.y);
-  const std::int64_t right = std::min(s.left + s.side, window.x + window.width);
-  const std::int64_t bottom = std::min(s.top + s.side, window.y + window.height);
+  const std::int64_t left = std::max(square.left, window.x);
+  const std::int64_t top = std::max(square.top, window.y);
+  const std::int64_t right = std::min(square.left + square.side, window.x + window.width);
+  const std::int64_t bottom = std::min(square.top + square.side, window.y + window.height);
   if (left >= right || top >= bottom) return;
-  const bool exact = s.side == lattice.step;
-  if (exact || IsFlat(lattice, s)) {
-    const auto side = static_cast<double>(s.side);
+  const bool exact = square.side == lattice.step;
+  if (exact || IsFlat(lattice, square)) {
+    const auto side = static_cast<double>(square.side);
     for (std::int64_t row = top; row < bottom; ++row) {
-      const double down = static_cast<double>(row - s.top) / side;
+      const double down = static_cast<double>(row - square.top) / side;
       const auto corner = [&](std::int64_t i, std::int64_t j) {
-        return lattice.At(s.left + i * s.side, s.top + j * s.side);
+        return lattice.At(square.left + i * square.side, square.top + j * square.side);
       };
       // A square of one pixel has no other corners.
       const Place first = exact ? corner(0, 0) : Between(corner(0, 0), corner(0, 1), down);
       const Place last = exact ? first : Between(corner(1, 0), corner(1, 1), down);
       const std::int64_t at = (row - window.y) * window.width + left - window.x;
-      const auto offset = static_cast<double>(left - s.left);
+      const auto offset = static_cast<double>(left - square.left);
       FillRow(first.x, last.x, offset, side, right - left, x + at);
       FillRow(first.y, last.y, offset, side, right - left, y + at);
     }
     return;
   }
-  const std::int64_t half = s.side / 2;
+  const std::int64_t half = square.side / 2;
   // Finer nodes once for the whole square: calls with many points cost less for each.
   const bool finer = half < 2 * lattice.step && lattice.step > 1;
   const std::int64_t step = lattice.step / 2;
-  const Lattice nodes =
-      finer ? Evaluate(s.left, s.top, s.side / step + 1, s.side / step + 1, step) : Lattice{};
+  const Lattice nodes = finer ? Evaluate(square.left, square.top, square.side / step + 1,
+                                         square.side / step + 1, step)
+                              : Lattice{};
   for (const std::int64_t j : {std::int64_t{0}, half}) {
     for (const std::int64_t i : {std::int64_t{0}, half}) {
-      FillPatch(finer ? nodes : lattice, {s.left + i, s.top + j, half}, window, x, y);
+      FillPatch(finer ? nodes : lattice, {square.left + i, square.top + j, half}, window, x, y);
     }
   }
 }

@@ -31,7 +31,7 @@ class PositionField {
   struct Lattice;
   struct Square;
 
-  void FillPatch(const Lattice& coarse, const Square& patch, const Window& window, double* x,
+  void FillPatch(const Lattice& lattice, const Square& square, const Window& window, double* x,
                  double* y);
   Lattice Evaluate(std::int64_t left, std::int64_t top, std::int64_t columns, std::int64_t rows,
                    std::int64_t step) const;

@@ -40,7 +40,7 @@ std::string WktOf(const OGRSpatialReference& crs) {
   char* text = nullptr;
   const char* const options[] = {"FORMAT=WKT2_2018", nullptr};
   if (crs.exportToWkt(&text, options) != OGRERR_NONE) return {};
-  const std::string wkt = text;
+  std::string wkt = text;
   CPLFree(text);
   return wkt;
 }

@@ -210,14 +210,6 @@ struct Target {
   const std::vector<T>& noData;  ///< empty: uncovered pixels stay as they are
 };
 
-// The place asked for may lie beyond the buffer, so it is no pointer into it.
-template <typename T>
-void AskFor(const T* samples, std::ptrdiff_t index) {
-  const auto bytes = static_cast<std::uintptr_t>(index) * sizeof(T);
-  __builtin_prefetch(
-      reinterpret_cast<const void*>(reinterpret_cast<std::uintptr_t>(samples) + bytes));
-}
-
 // The pixels that positions lie in; -1 for those outside.
 ZARN_VECTORISED
 void FindPixels(const double* x, const double* y, std::ptrdiff_t count, int width, int height,
@@ -255,10 +247,14 @@ class NearestRows {
     const int* const rows = rows_.data();
     const std::ptrdiff_t channels =
         kBytes != 0 ? static_cast<std::ptrdiff_t>(kBytes / sizeof(T)) : from.channels;
+    const std::ptrdiff_t last = std::max<std::ptrdiff_t>(from.width * from.height - 1, 0);
     const bool settles = target_.mask != nullptr;
     for (std::ptrdiff_t i = 0; i < count; ++i) {
       const std::ptrdiff_t index = rows[i] * from.width + columns[i];
-      if (i % 4 == 0) AskFor(from.samples, (index + ahead) * channels);
+      if (i % 4 == 0) {
+        const std::ptrdiff_t soon = std::clamp<std::ptrdiff_t>(index + ahead, 0, last);
+        __builtin_prefetch(from.samples + soon * channels);
+      }
       const bool covered = columns[i] >= 0 && (from.mask == nullptr || from.mask[index] != 0);
       if (covered) {
         std::memcpy(to + i * channels, from.samples + index * channels,
@@ -381,7 +377,7 @@ class InterpolatedRows {
 
   Source<T> source_;
   Target<T> target_;
-  bool cubic_;
+  [[maybe_unused]] bool cubic_;
   Interpolator<T> interpolate_;
 };
 

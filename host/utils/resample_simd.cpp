@@ -269,13 +269,14 @@ class RunKernel {
     const std::uint64_t* const index = scratch_.index.data();
     std::uint64_t* const words = scratch_.words.data();
     const std::size_t count = count_;
-    // It may lie beyond the source, so it is no pointer into it.
-    const auto ahead = static_cast<std::uintptr_t>(source_.ahead) * pixelBytes;
+    const std::ptrdiff_t ahead = source_.ahead;
+    const std::ptrdiff_t last = source_.width * source_.height - 1;
     for (std::size_t i = 0; i < count; ++i) {
       const std::byte* from = first + index[i] * pixelBytes;
       if (i % 4 == 0) {
-        hwy::Prefetch(
-            reinterpret_cast<const void*>(reinterpret_cast<std::uintptr_t>(from) + ahead));
+        const auto soon =
+            std::clamp<std::ptrdiff_t>(static_cast<std::ptrdiff_t>(index[i]) + ahead, 0, last);
+        hwy::Prefetch(first + static_cast<std::size_t>(soon) * pixelBytes);
       }
       for (std::size_t r = 0; r < kTaps; ++r, from += rowBytes) {
         for (std::size_t k = 0; k < kWords; ++k) {

@@ -30,7 +30,7 @@ enum class RunPixel : std::uint8_t {
 /// What a kernel keeps between its steps.
 struct RunScratch {
   static constexpr std::size_t kWords =
-      4 * 12;  ///< most of a pixel: four rows of three doubles each
+      std::size_t{4} * 12;  ///< most of a pixel: four rows of three doubles each
 
   alignas(64) std::array<double, kResampleRun> fractionX;
   alignas(64) std::array<double, kResampleRun> fractionY;
