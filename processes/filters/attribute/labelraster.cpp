@@ -48,7 +48,7 @@ class LabelRasterOf final : public LabelRaster {
 
   bool FlagUnlabelled(const void* row, std::size_t count, std::uint8_t* flags) const override {
     const A noData = rule_.noData();
-    return FlagExcluded(static_cast<const A*>(row), 0, count, 1, &noData, nullptr, flags);
+    return FlagExcluded(static_cast<const A*>(row), count, 1, &noData, nullptr, flags);
   }
 
   void FlagPools(const PoolRun& run) const override {
