@@ -37,19 +37,18 @@ class LabelRasterOf final : public LabelRaster {
       std::copy_n(Label(x, y), pixels, labels);
       return;
     }
-    for (std::ptrdiff_t i = 0; i < pixels;) {
+    const A* label = Label(x, y);
+    std::ptrdiff_t column = x / scale_;
+    for (std::ptrdiff_t i = 0; i < pixels; ++column, ++label) {
       // Rounding towards zero, the pixels before the first share its label.
-      const std::ptrdiff_t column = (x + i) / scale_;
       const std::ptrdiff_t next = column < 0 ? column * scale_ + 1 : (column + 1) * scale_;
-      const std::ptrdiff_t end = std::min(pixels, next - x);
-      std::fill(labels + i, labels + end, *Label(x + i, y));
-      i = end;
+      for (const std::ptrdiff_t end = std::min(pixels, next - x); i < end; ++i) labels[i] = *label;
     }
   }
 
   bool FlagUnlabelled(const void* row, std::size_t count, std::uint8_t* flags) const override {
     const A noData = rule_.noData();
-    return FlagExcluded(static_cast<const A*>(row), 0, count, 1, &noData, nullptr, flags);
+    return FlagExcluded(static_cast<const A*>(row), count, 1, &noData, nullptr, flags);
   }
 
   void FlagPools(const PoolRun& run) const override {

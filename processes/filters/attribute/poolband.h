@@ -10,6 +10,7 @@
 
 #include "processes/filters/attribute/filteralgo.h"
 #include "processes/filters/attribute/pooling.h"
+#include "processes/filters/attribute/poolplanes_simd.h"
 #include "processes/filters/attribute/poolstatistics_simd.h"
 #include "processes/filters/framework/orderedkeys.h"
 #include "processes/filters/framework/samplerows_simd.h"
@@ -128,7 +129,6 @@ struct PoolScratch {
   const void** cells;
   T* pixels;
   T* planes;
-  std::uint8_t* mask;
   std::uint8_t* flags;
   std::uint8_t* counts8;
   std::uint16_t* counts16;
@@ -176,7 +176,6 @@ struct PoolScratch {
     s.cells = take(std::type_identity<const void*>(), plan.Cells());
     s.pixels = take(samples, pitch * plan.Channels());
     s.planes = take(samples, pitch * plan.Channels());
-    s.mask = take(bytes, pitch);
     s.flags = take(bytes, plan.Cells() * plan.Segment());
     s.counts8 = take(bytes, segment);
     s.counts16 = take(std::type_identity<std::uint16_t>(), segment);
@@ -262,14 +261,9 @@ class PoolBand {
     T* const planes = plan_.Keyed() ? scratch_.planes : samples + lead;
     SplitChannels(scratch_.pixels, count, channels, planes, pitch);
     if (job_.hasInputMask || !job_.noData.empty()) {
-      const std::uint8_t* mask = nullptr;
-      if (job_.hasInputMask) {
-        std::memcpy(scratch_.mask, job_.inputMask.Pixel(x, y), count);
-        mask = scratch_.mask;
-      }
-      row.anyExcluded = FlagExcluded(planes, pitch, count, channels,
-                                     job_.noData.empty() ? nullptr : job_.noData.data(), mask,
-                                     row.excluded + lead);
+      row.anyExcluded = FlagExcluded(
+          scratch_.pixels, count, channels, job_.noData.empty() ? nullptr : job_.noData.data(),
+          job_.hasInputMask ? job_.inputMask.Pixel(x, y) : nullptr, row.excluded + lead);
     }
     if (!plan_.Keyed()) return;
     Key* const keys = reinterpret_cast<Key*>(row.samples) + lead;
@@ -330,8 +324,7 @@ class PoolBand {
     }
     if (any) std::memcpy(scratch_.old, out, samples * sizeof(T));
     JoinChannels(scratch_.results, plan_.SegmentPitch(), count, plan_.Channels(),
-                 ExcludedPixels<T>{any ? scratch_.kept : nullptr, nullptr, scratch_.old},
-                 scratch_.joined);
+                 any ? scratch_.kept : nullptr, scratch_.old, scratch_.joined);
     std::memcpy(out, scratch_.joined, samples * sizeof(T));
   }
 
