@@ -60,7 +60,7 @@ class NoDataMarker {
 class SourceReader {
  public:
   SourceReader(const RasterSource& source, MaskFile* mask, const NoDataValues& noData)
-      : reader_(source, mask, noData, 0), isNoData_(source, noData.input) {}
+      : reader_(source, noData, {.mask = mask}), isNoData_(source, noData.input) {}
 
   std::size_t BytesPerPixel() const {
     return 2 * reader_.SampleBytes() + reader_.SideBytes() + (isNoData_ ? 1 : 0);

@@ -287,8 +287,9 @@ void AddResampleCommand(CLI::App& app) {
       ->type_name("PIXELS")
       ->check(CLI::NonNegativeNumber)
       ->capture_default_str();
-  AddImageFilterOptions(command, options->image,
-                        "Raster of the size of IN; pixels where it is 0 take no part");
+  AddImageFilterOptions(
+      command, options->image,
+      {.maskHelp = "Raster of the size of IN; pixels where it is 0 take no part"});
   command.callback([options] { RunResample(*options); });
   command.footer(
       "IN may have a geotransform, control points, geolocation arrays or an RPC model. Pixels that "

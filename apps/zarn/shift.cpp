@@ -84,8 +84,9 @@ void AddShiftCommand(CLI::App& app) {
                   "Pixel (x, y) of OUT is pixel (x, y + N) of IN: it moves N rows up")
       ->type_name("N")
       ->capture_default_str();
-  AddImageFilterOptions(command, options->image,
-                        "Raster of the size of IN; pixels where it is 0 are copied all the same");
+  AddImageFilterOptions(
+      command, options->image,
+      {.maskHelp = "Raster of the size of IN; pixels where it is 0 are copied all the same"});
   command.callback([options] {
     RunRegridding(options->image,
                   [&](const RasterSource& source) { return Fit(*options, source); });
