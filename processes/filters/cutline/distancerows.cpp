@@ -1,0 +1,98 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "processes/filters/cutline/distancerows.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+
+namespace zarn::processes::filters {
+
+DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
+                           std::size_t mostGroups)
+    : index_(index),
+      left_(static_cast<double>(left)),
+      width_(width),
+      reach_(index.Blend() + index.DistanceTolerance()),
+      groups_(mostGroups),
+      distances_(WordsFor(width) * kWordColumns),
+      touched_(WordsFor(WordsFor(width))) {}
+
+void DistanceRows::Prepare(std::int64_t first, std::int64_t last) {
+  count_ = 0;
+  index_.ForEachGroup(first, last,
+                      [&](const PolygonRowIndex::Group& group) { groups_[count_++] = &group; });
+}
+
+// The columns whose centres may be within reach of the group's edges.
+DistanceRows::Columns DistanceRows::Reach(const PolygonRowIndex::Group& group, double y) const {
+  const double above = std::max({group.minY - y, y - group.maxY, 0.0});
+  if (above > reach_) return {0, 0};
+  const double aside = std::sqrt(reach_ * reach_ - above * above);
+  double low = group.minX - aside;
+  double high = group.maxX + aside;
+  if (group.end - group.begin == 1) {
+    // A long edge is near only where the row passes between two parallels to it. Horizontal ones
+    // give no number here, which changes nothing.
+    const PolygonEdge& edge = index_.Edges()[group.begin];
+    const double dx = edge.x1 - edge.x0;
+    const double dy = edge.y1 - edge.y0;
+    const double crossing = edge.x0 + dx / dy * (y - edge.y0);
+    const double half = std::sqrt(dx * dx + dy * dy) / std::abs(dy) * reach_ * (1 + 1e-9) +
+                        index_.DistanceTolerance();
+    low = std::max(low, crossing - half);
+    high = std::min(high, crossing + half);
+  }
+  const auto columns = static_cast<double>(width_);
+  const double first = std::floor(low - left_) - 1;
+  const double end = std::ceil(high - left_) + 1;
+  // What is not a number leaves the whole row.
+  return {first > 0 ? static_cast<std::size_t>(std::min(first, columns)) : 0,
+          end < columns ? static_cast<std::size_t>(std::max(end, 0.0)) : width_};
+}
+
+// Makes the words of these columns ready for use.
+void DistanceRows::Touch(Columns columns) {
+  for (std::size_t w = columns.first / kWordColumns; w * kWordColumns < columns.end; ++w) {
+    std::uint64_t& bits = touched_[w / kWordColumns];
+    const std::uint64_t bit = std::uint64_t{1} << w % kWordColumns;
+    if ((bits & bit) != 0) continue;
+    bits |= bit;
+    std::fill_n(distances_.begin() + static_cast<std::ptrdiff_t>(w * kWordColumns), kWordColumns,
+                std::numeric_limits<double>::infinity());
+  }
+}
+
+void DistanceRows::Compute(std::int64_t row, const PixelBits& inside, PixelBits& band) {
+  std::fill(band.begin(), band.end(), 0);
+  std::fill(touched_.begin(), touched_.end(), 0);
+  const double y = static_cast<double>(row) + 0.5;
+  for (std::size_t g = 0; g < count_; ++g) {
+    const PolygonRowIndex::Group& group = *groups_[g];
+    if (row < group.firstRow || row > group.lastRow) continue;
+    const Columns columns = Reach(group, y);
+    if (columns.first >= columns.end) continue;
+    Touch(columns);
+    for (std::uint32_t i = group.begin; i < group.end; ++i) {
+      const PolygonEdge& edge = index_.Edges()[i];
+      if (row < edge.firstBand || row > edge.lastBand) continue;
+      for (std::size_t x = columns.first; x < columns.end; ++x) {
+        const double squared = SquaredDistance(edge, left_ + static_cast<double>(x) + 0.5, y);
+        distances_[x] = std::min(distances_[x], squared);
+      }
+    }
+  }
+  for (std::size_t w = 0; w < band.size(); ++w) {
+    if ((touched_[w / kWordColumns] >> w % kWordColumns & 1) == 0) continue;
+    double* const weights = distances_.data() + w * kWordColumns;
+    for (std::size_t i = 0; i < kWordColumns; ++i) {
+      const double weight = std::sqrt(weights[i]) / index_.Blend();
+      weights[i] = (inside[w] >> i & 1) != 0 ? weight : -weight;
+      band[w] |= std::uint64_t{weight < 1.0} << i;
+    }
+  }
+  if (width_ % kWordColumns != 0) {
+    band.back() &= (std::uint64_t{1} << width_ % kWordColumns) - 1;
+  }
+}
+
+}  // namespace zarn::processes::filters

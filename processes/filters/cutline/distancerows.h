@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <vector>
+
+#include "processes/filters/cutline/pixelbits.h"
+#include "processes/filters/cutline/polygonrowindex.h"
+
+namespace zarn::processes::filters {
+
+/// The weights of a row's pixels within the band of a cutline, exactly as
+/// `PolygonRowIndex::DistanceToEdge` gives them.
+///
+/// Each edge lowers the squared distances of the columns that it may be near to; pixels farther
+/// than the blend width from all edges are either copied or left, whatever their distance.
+class DistanceRows {
+ public:
+  /// For rows of `width` pixels from column `left` on. Keeps the address of `index`; `mostGroups`
+  /// is the most that `Prepare` will meet.
+  DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
+               std::size_t mostGroups);
+
+  /// Collects the edges of the rows `first` .. `last`.
+  void Prepare(std::int64_t first, std::int64_t last);
+  /// Writes the bits of the pixels of one of these rows whose weights lie between -1 and 1.
+  void Compute(std::int64_t row, const PixelBits& inside, PixelBits& band);
+  /// The weights of those pixels.
+  const double* Weights() const { return distances_.data(); }
+
+ private:
+  struct Columns {
+    std::size_t first;
+    std::size_t end;
+  };
+
+  Columns Reach(const PolygonRowIndex::Group& group, double y) const;
+  void Touch(Columns columns);
+
+  const PolygonRowIndex& index_;
+  double left_;
+  std::size_t width_;
+  double reach_;
+  std::size_t count_ = 0;
+  std::vector<const PolygonRowIndex::Group*> groups_;
+  std::vector<double> distances_;  ///< squared ones, then weights; whole words
+  PixelBits touched_;              ///< the words of `distances_` that are in use
+};
+
+}  // namespace zarn::processes::filters
