@@ -5,7 +5,23 @@
 #include <cmath>
 #include <limits>
 
+#if ZARN_SIMD
+#include "processes/filters/cutline/distancerows_simd.h"
+#include "processes/filters/framework/samplerows_simd.h"
+#endif
+
 namespace zarn::processes::filters {
+namespace {
+
+bool UseVectors() {
+#if ZARN_SIMD
+  return HasVectors();
+#else
+  return false;
+#endif
+}
+
+}  // namespace
 
 DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
                            std::size_t mostGroups)
@@ -14,6 +30,9 @@ DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std:
       width_(width),
       reach_(index.Blend() + index.DistanceTolerance()),
       groups_(mostGroups),
+      near_(mostGroups),
+      ordered_(mostGroups),
+      vectors_(UseVectors()),
       distances_(WordsFor(width) * kWordColumns),
       touched_(WordsFor(WordsFor(width))) {}
 
@@ -24,8 +43,8 @@ void DistanceRows::Prepare(std::int64_t first, std::int64_t last) {
 }
 
 // The columns whose centres may be within reach of the group's edges.
-DistanceRows::Columns DistanceRows::Reach(const PolygonRowIndex::Group& group, double y) const {
-  const double above = std::max({group.minY - y, y - group.maxY, 0.0});
+DistanceRows::Columns DistanceRows::Reach(const PolygonRowIndex::Group& group, double above,
+                                          double y) const {
   if (above > reach_) return {0, 0};
   const double aside = std::sqrt(reach_ * reach_ - above * above);
   double low = group.minX - aside;
@@ -62,28 +81,87 @@ void DistanceRows::Touch(Columns columns) {
   }
 }
 
-void DistanceRows::Compute(std::int64_t row, const PixelBits& inside, PixelBits& band) {
-  std::fill(band.begin(), band.end(), 0);
-  std::fill(touched_.begin(), touched_.end(), 0);
-  const double y = static_cast<double>(row) + 0.5;
+void DistanceRows::CollectNear(std::int64_t row, double y) {
+  nearCount_ = 0;
   for (std::size_t g = 0; g < count_; ++g) {
     const PolygonRowIndex::Group& group = *groups_[g];
     if (row < group.firstRow || row > group.lastRow) continue;
-    const Columns columns = Reach(group, y);
+    const double above = std::max({group.minY - y, y - group.maxY, 0.0});
+    const Columns columns = Reach(group, above, y);
     if (columns.first >= columns.end) continue;
     Touch(columns);
-    for (std::uint32_t i = group.begin; i < group.end; ++i) {
-      const PolygonEdge& edge = index_.Edges()[i];
-      if (row < edge.firstBand || row > edge.lastBand) continue;
-      for (std::size_t x = columns.first; x < columns.end; ++x) {
-        const double squared = SquaredDistance(edge, left_ + static_cast<double>(x) + 0.5, y);
-        distances_[x] = std::min(distances_[x], squared);
-      }
+    near_[nearCount_++] = {&group, above, columns};
+  }
+}
+
+// Those next to the row first: they leave little to do for the others.
+void DistanceRows::OrderNear() {
+  constexpr std::size_t kSteps = 32;
+  const auto stepOf = [&](const Near& near) {
+    return static_cast<std::size_t>(near.above / reach_ * (kSteps - 1));
+  };
+  std::size_t begin[kSteps + 1] = {};
+  for (std::size_t i = 0; i < nearCount_; ++i) ++begin[stepOf(near_[i]) + 1];
+  for (std::size_t step = 0; step < kSteps; ++step) begin[step + 1] += begin[step];
+  for (std::size_t i = 0; i < nearCount_; ++i) ordered_[begin[stepOf(near_[i])]++] = near_[i];
+  near_.swap(ordered_);
+}
+
+void DistanceRows::Lower(const Near& near, Columns columns, std::int64_t row) {
+  const PolygonRowIndex::Group& group = *near.group;
+  const PolygonEdge* const edges = index_.Edges().data();
+#if ZARN_SIMD
+  if (vectors_) {
+    const double slack = index_.DistanceTolerance();
+    LowerDistances({.edges = edges + group.begin,
+                    .count = group.end - group.begin,
+                    .minX = group.minX - slack,
+                    .maxX = group.maxX + slack,
+                    .above = std::max(near.above - slack, 0.0)},
+                   columns.first, columns.end, {distances_.data(), left_, row});
+    return;
+  }
+#endif
+  const double y = static_cast<double>(row) + 0.5;
+  for (std::uint32_t i = group.begin; i < group.end; ++i) {
+    if (row < edges[i].firstBand || row > edges[i].lastBand) continue;
+    for (std::size_t x = columns.first; x < columns.end; ++x) {
+      const double squared = SquaredDistance(edges[i], left_ + static_cast<double>(x) + 0.5, y);
+      distances_[x] = std::min(distances_[x], squared);
     }
   }
+}
+
+void DistanceRows::Compute(std::int64_t row, const PixelBits& inside, PixelBits& band) {
+  std::fill(band.begin(), band.end(), 0);
+  std::fill(touched_.begin(), touched_.end(), 0);
+  CollectNear(row, static_cast<double>(row) + 0.5);
+  // Few groups are not worth the order.
+  constexpr std::size_t kMany = 16;
+  if (vectors_ && nearCount_ > kMany) {
+    OrderNear();
+    // First every group where it is itself, then the wider reach of each, most of which is nearer
+    // to others by then.
+    for (std::size_t i = 0; i < nearCount_; ++i) {
+      const Near& near = near_[i];
+      const double low = near.group->minX - left_;
+      const double high = near.group->maxX - left_ + 1;
+      Columns own = near.columns;
+      if (low > static_cast<double>(own.first)) own.first = static_cast<std::size_t>(low);
+      if (high < static_cast<double>(own.end)) own.end = static_cast<std::size_t>(high);
+      if (high > 0 && own.first < own.end) Lower(near, own, row);
+    }
+  }
+  for (std::size_t i = 0; i < nearCount_; ++i) Lower(near_[i], near_[i].columns, row);
   for (std::size_t w = 0; w < band.size(); ++w) {
     if ((touched_[w / kWordColumns] >> w % kWordColumns & 1) == 0) continue;
     double* const weights = distances_.data() + w * kWordColumns;
+#if ZARN_SIMD
+    if (vectors_) {
+      band[w] = WeighDistances(weights, inside[w], index_.Blend());
+      continue;
+    }
+#endif
     for (std::size_t i = 0; i < kWordColumns; ++i) {
       const double weight = std::sqrt(weights[i]) / index_.Blend();
       weights[i] = (inside[w] >> i & 1) != 0 ? weight : -weight;

@@ -34,9 +34,18 @@ class DistanceRows {
     std::size_t first;
     std::size_t end;
   };
+  // A group that the row at hand is within reach of.
+  struct Near {
+    const PolygonRowIndex::Group* group;
+    double above;  // how far the row is from its box
+    Columns columns;
+  };
 
-  Columns Reach(const PolygonRowIndex::Group& group, double y) const;
+  Columns Reach(const PolygonRowIndex::Group& group, double above, double y) const;
   void Touch(Columns columns);
+  void CollectNear(std::int64_t row, double y);
+  void OrderNear();
+  void Lower(const Near& near, Columns columns, std::int64_t row);
 
   const PolygonRowIndex& index_;
   double left_;
@@ -44,6 +53,10 @@ class DistanceRows {
   double reach_;
   std::size_t count_ = 0;
   std::vector<const PolygonRowIndex::Group*> groups_;
+  std::size_t nearCount_ = 0;
+  std::vector<Near> near_;
+  std::vector<Near> ordered_;
+  bool vectors_;
   std::vector<double> distances_;  ///< squared ones, then weights; whole words
   PixelBits touched_;              ///< the words of `distances_` that are in use
 };
