@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <span>
 
 #if ZARN_SIMD
 #include "processes/filters/cutline/distancerows_simd.h"
@@ -38,35 +39,46 @@ DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std:
 
 void DistanceRows::Prepare(std::int64_t first, std::int64_t last) {
   count_ = 0;
-  index_.ForEachGroup(first, last,
-                      [&](const PolygonRowIndex::Group& group) { groups_[count_++] = &group; });
-}
-
-// The columns whose centres may be within reach of the group's edges.
-DistanceRows::Columns DistanceRows::Reach(const PolygonRowIndex::Group& group, double above,
-                                          double y) const {
-  if (above > reach_) return {0, 0};
-  const double aside = std::sqrt(reach_ * reach_ - above * above);
-  double low = group.minX - aside;
-  double high = group.maxX + aside;
-  if (group.end - group.begin == 1) {
-    // A long edge is near only where the row passes between two parallels to it. Horizontal ones
-    // give no number here, which changes nothing.
+  index_.ForEachGroup(first, last, [&](const PolygonRowIndex::Group& group) {
     const PolygonEdge& edge = index_.Edges()[group.begin];
     const double dx = edge.x1 - edge.x0;
     const double dy = edge.y1 - edge.y0;
-    const double crossing = edge.x0 + dx / dy * (y - edge.y0);
     const double half = std::sqrt(dx * dx + dy * dy) / std::abs(dy) * reach_ * (1 + 1e-9) +
                         index_.DistanceTolerance();
-    low = std::max(low, crossing - half);
-    high = std::min(high, crossing + half);
-  }
+    groups_[count_++] = {&group, dx / dy, half};
+  });
+}
+
+// The columns whose centres may lie between the two; what is not a number sets no end.
+DistanceRows::Columns DistanceRows::Held(double low, double high) const {
   const auto columns = static_cast<double>(width_);
   const double first = std::floor(low - left_) - 1;
   const double end = std::ceil(high - left_) + 1;
-  // What is not a number leaves the whole row.
   return {first > 0 ? static_cast<std::size_t>(std::min(first, columns)) : 0,
           end < columns ? static_cast<std::size_t>(std::max(end, 0.0)) : width_};
+}
+
+// What of a group the row may be within reach of.
+DistanceRows::Near DistanceRows::Reach(const Prepared& prepared, double y) const {
+  const PolygonRowIndex::Group& group = *prepared.group;
+  const double above = std::max({group.minY - y, y - group.maxY, 0.0});
+  if (above > reach_) return {&group, above, {}, {}};
+  const double aside = above > 0 ? std::sqrt(reach_ * reach_ - above * above) : reach_;
+  double low = group.minX - aside;
+  double high = group.maxX + aside;
+  double ownLow = group.minX;
+  double ownHigh = group.maxX;
+  if (group.end - group.begin == 1) {
+    // A long edge is near only where the row passes between two parallels to it. (A comparison with
+    // what is not a number changes nothing.)
+    const PolygonEdge& edge = index_.Edges()[group.begin];
+    const double crossing = edge.x0 + prepared.slope * (y - edge.y0);
+    low = std::max(low, crossing - prepared.half);
+    high = std::min(high, crossing + prepared.half);
+    ownLow = std::max(ownLow, crossing - 1);
+    ownHigh = std::min(ownHigh, crossing + 1);
+  }
+  return {&group, above, Held(low, high), Held(ownLow, ownHigh)};
 }
 
 // Makes the words of these columns ready for use.
@@ -84,13 +96,15 @@ void DistanceRows::Touch(Columns columns) {
 void DistanceRows::CollectNear(std::int64_t row, double y) {
   nearCount_ = 0;
   for (std::size_t g = 0; g < count_; ++g) {
-    const PolygonRowIndex::Group& group = *groups_[g];
+    const PolygonRowIndex::Group& group = *groups_[g].group;
     if (row < group.firstRow || row > group.lastRow) continue;
-    const double above = std::max({group.minY - y, y - group.maxY, 0.0});
-    const Columns columns = Reach(group, above, y);
-    if (columns.first >= columns.end) continue;
-    Touch(columns);
-    near_[nearCount_++] = {&group, above, columns};
+    Near near = Reach(groups_[g], y);
+    if (near.columns.first >= near.columns.end) continue;
+    // Whole vectors, so that the two parts beside them start anew.
+    near.own.first = std::max(near.own.first, near.columns.first) / 8 * 8;
+    near.own.end = (std::min(near.own.end, near.columns.end) + 7) / 8 * 8;
+    Touch(near.columns);
+    near_[nearCount_++] = near;
   }
 }
 
@@ -108,6 +122,7 @@ void DistanceRows::OrderNear() {
 }
 
 void DistanceRows::Lower(const Near& near, Columns columns, std::int64_t row) {
+  if (columns.first >= columns.end) return;
   const PolygonRowIndex::Group& group = *near.group;
   const PolygonEdge* const edges = index_.Edges().data();
 #if ZARN_SIMD
@@ -142,17 +157,15 @@ void DistanceRows::Compute(std::int64_t row, const PixelBits& inside, PixelBits&
     OrderNear();
     // First every group where it is itself, then the wider reach of each, most of which is nearer
     // to others by then.
-    for (std::size_t i = 0; i < nearCount_; ++i) {
-      const Near& near = near_[i];
-      const double low = near.group->minX - left_;
-      const double high = near.group->maxX - left_ + 1;
-      Columns own = near.columns;
-      if (low > static_cast<double>(own.first)) own.first = static_cast<std::size_t>(low);
-      if (high < static_cast<double>(own.end)) own.end = static_cast<std::size_t>(high);
-      if (high > 0 && own.first < own.end) Lower(near, own, row);
+    const std::span<const Near> all(near_.data(), nearCount_);
+    for (const Near& near : all) Lower(near, near.own, row);
+    for (const Near& near : all) {
+      Lower(near, {near.columns.first, std::min(near.own.first, near.columns.end)}, row);
+      Lower(near, {std::max(near.own.end, near.columns.first), near.columns.end}, row);
     }
+  } else {
+    for (std::size_t i = 0; i < nearCount_; ++i) Lower(near_[i], near_[i].columns, row);
   }
-  for (std::size_t i = 0; i < nearCount_; ++i) Lower(near_[i], near_[i].columns, row);
   for (std::size_t w = 0; w < band.size(); ++w) {
     if ((touched_[w / kWordColumns] >> w % kWordColumns & 1) == 0) continue;
     double* const weights = distances_.data() + w * kWordColumns;

@@ -34,14 +34,23 @@ class DistanceRows {
     std::size_t first;
     std::size_t end;
   };
+  struct Prepared {
+    const PolygonRowIndex::Group* group;
+    // Of a group of one edge: columns per row, and how far to both sides of it the columns within
+    // reach of its line extend in a row. Infinite or no number where it is horizontal.
+    double slope;
+    double half;
+  };
   // A group that the row at hand is within reach of.
   struct Near {
     const PolygonRowIndex::Group* group;
     double above;  // how far the row is from its box
     Columns columns;
+    Columns own;  // where the row meets the group itself
   };
 
-  Columns Reach(const PolygonRowIndex::Group& group, double above, double y) const;
+  Near Reach(const Prepared& prepared, double y) const;
+  Columns Held(double low, double high) const;
   void Touch(Columns columns);
   void CollectNear(std::int64_t row, double y);
   void OrderNear();
@@ -52,7 +61,7 @@ class DistanceRows {
   std::size_t width_;
   double reach_;
   std::size_t count_ = 0;
-  std::vector<const PolygonRowIndex::Group*> groups_;
+  std::vector<Prepared> groups_;
   std::size_t nearCount_ = 0;
   std::vector<Near> near_;
   std::vector<Near> ordered_;

@@ -83,22 +83,26 @@ HWY_ATTR void Lower(const NearEdges& near, std::size_t first, std::size_t end,
   const auto centre = [&](std::size_t i) HWY_ATTR {
     return hn::Add(hn::Add(hn::Set(d, row.left + static_cast<double>(i)), lane), half);
   };
-  first -= first % lanes;
+  // The pixels of a vector that the box may still lower.
+  const auto mayLower = [&](V x, V best) HWY_ATTR {
+    const V aside = hn::Max(hn::Max(hn::Sub(minX, x), hn::Sub(x, maxX)), hn::Zero(d));
+    const V bound = hn::Add(hn::Mul(hn::Mul(aside, aside), shrink), above);
+    return !hn::AllTrue(d, hn::Gt(bound, best));
+  };
+  std::size_t i = first - first % lanes;
   if (near.count == 1) {
+    while (i < end && !mayLower(centre(i), hn::LoadU(d, row.squared + i))) i += lanes;
+    if (i >= end) return;
     const EdgeVectors edge(d, *near.edges, y);
-    for (std::size_t i = first; i < end; i += lanes) {
+    for (; i < end; i += lanes) {
       hn::StoreU(edge.Lower(d, centre(i), hn::LoadU(d, row.squared + i)), d, row.squared + i);
     }
     return;
   }
-  // The columns that the box may still lower, in strips of all of them per edge: an edge's numbers
-  // are prepared once.
-  for (std::size_t i = first; i < end; i += lanes) {
+  for (; i < end; i += lanes) {
     const V x = centre(i);
     V best = hn::LoadU(d, row.squared + i);
-    const V aside = hn::Max(hn::Max(hn::Sub(minX, x), hn::Sub(x, maxX)), hn::Zero(d));
-    const V bound = hn::Add(hn::Mul(hn::Mul(aside, aside), shrink), above);
-    if (hn::AllTrue(d, hn::Gt(bound, best))) continue;
+    if (!mayLower(x, best)) continue;
     for (std::size_t k = 0; k < near.count; ++k) {
       const PolygonEdge& edge = near.edges[k];
       if (row.row < edge.firstBand || row.row > edge.lastBand) continue;

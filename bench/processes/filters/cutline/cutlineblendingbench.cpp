@@ -164,7 +164,7 @@ const bool kRegistered = [] {
   for (const unsigned blend : {0U, 10U, 50U}) {
     for (const int count : {10, 100, 1000, 20000, 50000}) {
       Register(
-          "star " + std::to_string(count), [=] { return Star(count, 1); }, blend);
+          "star " + std::to_string(count), [=] { return Star(count, 0.25); }, blend);
     }
     Register(
         "spikes 20000", [] { return Star(20000, 150); }, blend);
@@ -176,7 +176,7 @@ const bool kRegistered = [] {
   // Making the factory and its filter, beside one pass.
   Compare({"cutline index 20000", "one pass", kBytes,
            [] {
-             const CutlineBlendingFactory factory(Closed(Star(20000, 1)), 10);
+             const CutlineBlendingFactory factory(Closed(Star(20000, 0.25)), 10);
              const std::unique_ptr<IFilter> filter(factory.GetCPUFilter());
            },
            [] {
