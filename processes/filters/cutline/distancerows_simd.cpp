@@ -89,8 +89,12 @@ HWY_ATTR void Lower(const NearEdges& near, std::size_t first, std::size_t end,
     const V bound = hn::Add(hn::Mul(hn::Mul(aside, aside), shrink), above);
     return !hn::AllTrue(d, hn::Gt(bound, best));
   };
+  const auto isInBand = [&](const PolygonEdge& edge) {
+    return row.row >= edge.firstBand && row.row <= edge.lastBand;
+  };
   std::size_t i = first - first % lanes;
   if (near.count == 1) {
+    if (!isInBand(*near.edges)) return;
     while (i < end && !mayLower(centre(i), hn::LoadU(d, row.squared + i))) i += lanes;
     if (i >= end) return;
     const EdgeVectors edge(d, *near.edges, y);
@@ -105,7 +109,7 @@ HWY_ATTR void Lower(const NearEdges& near, std::size_t first, std::size_t end,
     if (!mayLower(x, best)) continue;
     for (std::size_t k = 0; k < near.count; ++k) {
       const PolygonEdge& edge = near.edges[k];
-      if (row.row < edge.firstBand || row.row > edge.lastBand) continue;
+      if (!isInBand(edge)) continue;
       best = EdgeVectors(d, edge, y).Lower(d, x, best);
     }
     hn::StoreU(best, d, row.squared + i);
