@@ -24,7 +24,8 @@ int ToInt(std::int64_t row) {
 CutlineBlendingBase::CutlineBlendingBase(const PolygonParam& cutlineParam, unsigned int blend)
     : cutline(IndexOf(cutlineParam, blend)) {}
 
-CutlineBlendingBase::CutlineBlendingBase(const CutlineBlendingBase& other) : IFilter() {
+CutlineBlendingBase::CutlineBlendingBase(const CutlineBlendingBase& other)
+    : CutlineBlendingBase(PolygonParam{}, 0) {
   *this = other;
 }
 
