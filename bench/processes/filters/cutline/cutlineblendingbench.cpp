@@ -49,7 +49,8 @@ Points AlongOneRow(int count) {
   std::mt19937 random(12);
   Points points;
   for (int i = 0; i < count; ++i) {
-    points.emplace_back(100 + 3900.0 * i / count, 2000.5 + 0.4 * static_cast<double>(random() % 1000) / 1000);
+    points.emplace_back(100 + 3900.0 * i / count,
+                        2000.5 + 0.4 * static_cast<double>(random() % 1000) / 1000);
   }
   points.emplace_back(4000, 4000);
   points.emplace_back(100, 4000);
@@ -173,8 +174,8 @@ const bool kRegistered = [] {
     Register(
         "comb 2000", [] { return Comb(2000); }, blend);
   }
-  // Making the factory and its filter, beside one pass.
-  Compare({"cutline index 20000", "one pass", kBytes,
+  // Making the factory and its filter.
+  Compare({"cutline index 20000", "copy into new memory", kBytes,
            [] {
              const CutlineBlendingFactory factory(Closed(Star(20000, 0.25)), 10);
              const std::unique_ptr<IFilter> filter(factory.GetCPUFilter());
