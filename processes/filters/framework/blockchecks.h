@@ -43,8 +43,9 @@ Refusal CheckBlocks(const gobs::Raster& input, const gobs::Raster& output,
 /// with the output.
 Refusal CheckSecondInput(const gobs::Raster& second, const gobs::Raster& output,
                          std::uint32_t channels);
-/// The same for a further block that is written beside them: no data or smaller than described, and
-/// memory shared with `block`.
+
+/// What is refused of a further block that is written beside `block`: no data or smaller than
+/// described, and memory shared with it.
 Refusal CheckApart(const gobs::Raster& further, const gobs::Raster& block);
 
 }  // namespace blockchecks
