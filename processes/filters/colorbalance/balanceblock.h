@@ -16,8 +16,7 @@ namespace zarn::processes::filters {
 /// Calls `visit` with the sample type where colour balancers and normalisation handle it.
 template <typename Visitor>
 FilterResult VisitBalanced(gobs::NativeDataTypeCode code, Visitor&& visit) {
-  return VisitSampleType(code, "Unknown raster block data type for color balancing",
-                         std::forward<Visitor>(visit));
+  return VisitSampleType(code, messages::kUnknownBalancedType, std::forward<Visitor>(visit));
 }
 
 /// What these families refuse before they write anything. `parameters` is the number of channels

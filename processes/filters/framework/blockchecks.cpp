@@ -62,4 +62,12 @@ Refusal CheckSecondInput(const gobs::Raster& second, const gobs::Raster& output,
   return {};
 }
 
+Refusal CheckApart(const gobs::Raster& further, const gobs::Raster& block) {
+  if (Inconsistent(further)) return FilterResult::Failure(messages::kInconsistentBlock);
+  if (Overlap(further, block, Aliasing::kForbidden)) {
+    return FilterResult::Failure(messages::kOverlap);
+  }
+  return {};
+}
+
 }  // namespace zarn::processes::filters::blockchecks

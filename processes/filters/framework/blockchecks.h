@@ -44,5 +44,9 @@ Refusal CheckBlocks(const gobs::Raster& input, const gobs::Raster& output,
 Refusal CheckSecondInput(const gobs::Raster& second, const gobs::Raster& output,
                          std::uint32_t channels);
 
+/// What is refused of a further block that is written beside `block`: no data or smaller than
+/// described, and memory shared with it.
+Refusal CheckApart(const gobs::Raster& further, const gobs::Raster& block);
+
 }  // namespace blockchecks
 }  // namespace zarn::processes::filters

@@ -13,6 +13,8 @@ inline constexpr const char* kFewNoDataValues = "Fewer no-data values than chann
 inline constexpr const char* kFewParameters = "Fewer parameters than channels.";
 inline constexpr const char* kInconsistentBlock =
     "Raster block has no data or an inconsistent size.";
+inline constexpr const char* kUnknownBalancedType =
+    "Unknown raster block data type for color balancing";
 inline constexpr const char* kOverlap = "Input and output rasters overlap.";
 
 }  // namespace zarn::processes::filters::messages

@@ -1,0 +1,189 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "processes/filters/cutline/distancerows.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <span>
+
+#if ZARN_SIMD
+#include "processes/filters/cutline/distancerows_simd.h"
+#include "processes/filters/framework/samplerows_simd.h"
+#endif
+
+namespace zarn::processes::filters {
+namespace {
+
+bool UseVectors() {
+#if ZARN_SIMD
+  return HasVectors();
+#else
+  return false;
+#endif
+}
+
+}  // namespace
+
+DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
+                           std::size_t mostGroups)
+    : index_(index),
+      left_(static_cast<double>(left)),
+      width_(width),
+      reach_(index.Blend() + index.DistanceTolerance()),
+      groups_(mostGroups),
+      near_(mostGroups),
+      ordered_(mostGroups),
+      vectors_(UseVectors()),
+      distances_(WordsFor(width) * kWordColumns),
+      touched_(WordsFor(WordsFor(width))) {}
+
+void DistanceRows::Prepare(std::int64_t first, std::int64_t last) {
+  count_ = 0;
+  index_.ForEachGroup(first, last, [&](const PolygonRowIndex::Group& group) {
+    const PolygonEdge& edge = index_.Edges()[group.begin];
+    const double dx = edge.x1 - edge.x0;
+    const double dy = edge.y1 - edge.y0;
+    const double half = std::sqrt(dx * dx + dy * dy) / std::abs(dy) * reach_ * (1 + 1e-9) +
+                        index_.DistanceTolerance();
+    groups_[count_++] = {&group, dx / dy, half};
+  });
+}
+
+// The columns whose centres may lie between the two; what is not a number sets no end.
+DistanceRows::Columns DistanceRows::Held(double low, double high) const {
+  const auto columns = static_cast<double>(width_);
+  const double first = std::floor(low - left_) - 1;
+  const double end = std::ceil(high - left_) + 1;
+  return {first > 0 ? static_cast<std::size_t>(std::min(first, columns)) : 0,
+          end < columns ? static_cast<std::size_t>(std::max(end, 0.0)) : width_};
+}
+
+// What of a group the row may be within reach of.
+DistanceRows::Near DistanceRows::Reach(const Prepared& prepared, double y) const {
+  const PolygonRowIndex::Group& group = *prepared.group;
+  const double above = std::max({group.minY - y, y - group.maxY, 0.0});
+  if (above > reach_) return {&group, above, {}, {}};
+  const double aside = above > 0 ? std::sqrt(reach_ * reach_ - above * above) : reach_;
+  double low = group.minX - aside;
+  double high = group.maxX + aside;
+  double ownLow = group.minX;
+  double ownHigh = group.maxX;
+  if (group.end - group.begin == 1) {
+    // A long edge is near only where the row passes between two parallels to it. (A comparison with
+    // what is not a number changes nothing.)
+    const PolygonEdge& edge = index_.Edges()[group.begin];
+    const double crossing = edge.x0 + prepared.slope * (y - edge.y0);
+    low = std::max(low, crossing - prepared.half);
+    high = std::min(high, crossing + prepared.half);
+    ownLow = std::max(ownLow, crossing - 1);
+    ownHigh = std::min(ownHigh, crossing + 1);
+  }
+  return {&group, above, Held(low, high), Held(ownLow, ownHigh)};
+}
+
+// Makes the words of these columns ready for use.
+void DistanceRows::Touch(Columns columns) {
+  for (std::size_t w = columns.first / kWordColumns; w * kWordColumns < columns.end; ++w) {
+    std::uint64_t& bits = touched_[w / kWordColumns];
+    const std::uint64_t bit = std::uint64_t{1} << w % kWordColumns;
+    if ((bits & bit) != 0) continue;
+    bits |= bit;
+    std::fill_n(distances_.begin() + static_cast<std::ptrdiff_t>(w * kWordColumns), kWordColumns,
+                std::numeric_limits<double>::infinity());
+  }
+}
+
+void DistanceRows::CollectNear(std::int64_t row, double y) {
+  nearCount_ = 0;
+  for (std::size_t g = 0; g < count_; ++g) {
+    const PolygonRowIndex::Group& group = *groups_[g].group;
+    if (row < group.firstRow || row > group.lastRow) continue;
+    Near near = Reach(groups_[g], y);
+    if (near.columns.first >= near.columns.end) continue;
+    // Whole vectors, so that the two parts beside them start anew.
+    near.own.first = std::max(near.own.first, near.columns.first) / 8 * 8;
+    near.own.end = (std::min(near.own.end, near.columns.end) + 7) / 8 * 8;
+    Touch(near.columns);
+    near_[nearCount_++] = near;
+  }
+}
+
+// Those next to the row first: they leave little to do for the others.
+void DistanceRows::OrderNear() {
+  constexpr std::size_t kSteps = 32;
+  const auto stepOf = [&](const Near& near) {
+    return static_cast<std::size_t>(near.above / reach_ * (kSteps - 1));
+  };
+  std::size_t begin[kSteps + 1] = {};
+  for (std::size_t i = 0; i < nearCount_; ++i) ++begin[stepOf(near_[i]) + 1];
+  for (std::size_t step = 0; step < kSteps; ++step) begin[step + 1] += begin[step];
+  for (std::size_t i = 0; i < nearCount_; ++i) ordered_[begin[stepOf(near_[i])]++] = near_[i];
+  near_.swap(ordered_);
+}
+
+void DistanceRows::Lower(const Near& near, Columns columns, std::int64_t row) {
+  if (columns.first >= columns.end) return;
+  const PolygonRowIndex::Group& group = *near.group;
+  const PolygonEdge* const edges = index_.Edges().data();
+#if ZARN_SIMD
+  if (vectors_) {
+    const double slack = index_.DistanceTolerance();
+    LowerDistances({.edges = edges + group.begin,
+                    .count = group.end - group.begin,
+                    .minX = group.minX - slack,
+                    .maxX = group.maxX + slack,
+                    .above = std::max(near.above - slack, 0.0)},
+                   columns.first, columns.end, {distances_.data(), left_, row});
+    return;
+  }
+#endif
+  const double y = static_cast<double>(row) + 0.5;
+  for (std::uint32_t i = group.begin; i < group.end; ++i) {
+    if (row < edges[i].firstBand || row > edges[i].lastBand) continue;
+    for (std::size_t x = columns.first; x < columns.end; ++x) {
+      const double squared = SquaredDistance(edges[i], left_ + static_cast<double>(x) + 0.5, y);
+      distances_[x] = std::min(distances_[x], squared);
+    }
+  }
+}
+
+void DistanceRows::Compute(std::int64_t row, const PixelBits& inside, PixelBits& band) {
+  std::fill(band.begin(), band.end(), 0);
+  std::fill(touched_.begin(), touched_.end(), 0);
+  CollectNear(row, static_cast<double>(row) + 0.5);
+  // Few groups are not worth the order.
+  constexpr std::size_t kMany = 16;
+  if (vectors_ && nearCount_ > kMany) {
+    OrderNear();
+    // First every group where it is itself, then the wider reach of each, most of which is nearer
+    // to others by then.
+    const std::span<const Near> all(near_.data(), nearCount_);
+    for (const Near& near : all) Lower(near, near.own, row);
+    for (const Near& near : all) {
+      Lower(near, {near.columns.first, std::min(near.own.first, near.columns.end)}, row);
+      Lower(near, {std::max(near.own.end, near.columns.first), near.columns.end}, row);
+    }
+  } else {
+    for (std::size_t i = 0; i < nearCount_; ++i) Lower(near_[i], near_[i].columns, row);
+  }
+  for (std::size_t w = 0; w < band.size(); ++w) {
+    if ((touched_[w / kWordColumns] >> w % kWordColumns & 1) == 0) continue;
+    double* const weights = distances_.data() + w * kWordColumns;
+#if ZARN_SIMD
+    if (vectors_) {
+      band[w] = WeighDistances(weights, inside[w], index_.Blend());
+      continue;
+    }
+#endif
+    for (std::size_t i = 0; i < kWordColumns; ++i) {
+      const double weight = std::sqrt(weights[i]) / index_.Blend();
+      weights[i] = (inside[w] >> i & 1) != 0 ? weight : -weight;
+      band[w] |= std::uint64_t{weight < 1.0} << i;
+    }
+  }
+  if (width_ % kWordColumns != 0) {
+    band.back() &= (std::uint64_t{1} << width_ % kWordColumns) - 1;
+  }
+}
+
+}  // namespace zarn::processes::filters

@@ -1,0 +1,73 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <vector>
+
+#include "processes/filters/cutline/pixelbits.h"
+#include "processes/filters/cutline/polygonrowindex.h"
+
+namespace zarn::processes::filters {
+
+/// The weights of a row's pixels within the band of a cutline, exactly as
+/// `PolygonRowIndex::DistanceToEdge` gives them.
+///
+/// Each edge lowers the squared distances of the columns that it may be near to; pixels farther
+/// than the blend width from all edges are either copied or left, whatever their distance.
+class DistanceRows {
+ public:
+  /// For rows of `width` pixels from column `left` on. Keeps the address of `index`; `mostGroups`
+  /// is the most that `Prepare` will meet.
+  DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
+               std::size_t mostGroups);
+
+  /// Collects the edges of the rows `first` .. `last`.
+  void Prepare(std::int64_t first, std::int64_t last);
+  /// Writes the bits of the pixels of one of these rows whose weights lie between -1 and 1.
+  void Compute(std::int64_t row, const PixelBits& inside, PixelBits& band);
+  /// The weights of those pixels.
+  const double* Weights() const { return distances_.data(); }
+
+ private:
+  struct Columns {
+    std::size_t first;
+    std::size_t end;
+  };
+  struct Prepared {
+    const PolygonRowIndex::Group* group;
+    // Of a group of one edge: columns per row, and how far to both sides of it the columns within
+    // reach of its line extend in a row. Infinite or no number where it is horizontal.
+    double slope;
+    double half;
+  };
+  // A group that the row at hand is within reach of.
+  struct Near {
+    const PolygonRowIndex::Group* group;
+    double above;  // how far the row is from its box
+    Columns columns;
+    Columns own;  // where the row meets the group itself
+  };
+
+  Near Reach(const Prepared& prepared, double y) const;
+  Columns Held(double low, double high) const;
+  void Touch(Columns columns);
+  void CollectNear(std::int64_t row, double y);
+  void OrderNear();
+  void Lower(const Near& near, Columns columns, std::int64_t row);
+
+  const PolygonRowIndex& index_;
+  double left_;
+  std::size_t width_;
+  double reach_;
+  std::size_t count_ = 0;
+  std::vector<Prepared> groups_;
+  std::size_t nearCount_ = 0;
+  std::vector<Near> near_;
+  std::vector<Near> ordered_;
+  bool vectors_;
+  std::vector<double> distances_;  ///< squared ones, then weights; whole words
+  PixelBits touched_;              ///< the words of `distances_` that are in use
+};
+
+}  // namespace zarn::processes::filters

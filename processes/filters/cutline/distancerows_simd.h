@@ -1,0 +1,39 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "processes/filters/cutline/pixelbits.h"
+#include "processes/filters/cutline/polygonedge.h"
+
+namespace zarn::processes::filters {
+
+/// A row of squared distances, whole words long, and the place of its pixels: that in column i has
+/// its centre at (left + i + 0.5, y).
+struct DistanceRow {
+  double* squared;
+  double left;
+  std::int64_t row;
+};
+
+/// Edges of one polygon that lie together. No distance to any of them that is computed in the row
+/// is below that to the box from `minX` to `maxX`, `above` the row.
+struct NearEdges {
+  const PolygonEdge* edges;
+  std::size_t count;
+  double minX;
+  double maxX;
+  double above;
+};
+
+/// Lowers the squared distances of the columns `first` .. `end` - 1, and maybe of others in the
+/// same words, to those that `SquaredDistance` gives for the edges of the row's band.
+void LowerDistances(const NearEdges& near, std::size_t first, std::size_t end,
+                    const DistanceRow& row);
+
+/// Turns the squared distances of one word into weights, negative where the pixel is not inside.
+/// Returns the bits of those between -1 and 1.
+std::uint64_t WeighDistances(double* squared, std::uint64_t inside, double blend);
+
+}  // namespace zarn::processes::filters
