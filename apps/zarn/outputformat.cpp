@@ -67,6 +67,7 @@ void AddCompression(CPLStringList& options, const SampleType& type) {
   setDefault("ZLEVEL", "1");
   // It works on whole bytes, so not on samples of the caller's own number of bits.
   if (options.FetchNameValue("NBITS") != nullptr) return;
+  if (GDALDataTypeIsComplex(type.gdal) != FALSE) return;
   setDefault("PREDICTOR", GDALDataTypeIsFloating(type.gdal) != FALSE ? "3" : "2");
 }
 

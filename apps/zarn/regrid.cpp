@@ -144,7 +144,8 @@ class Regridder {
     result.alphas.Shape(window.width, window.height, source_.Alphas().size() * bytes);
     result.fileMask.Shape(window.width, window.height, writesMask_ ? 1 : 0);
     slot.covered.Shape(window.width, window.height, 1);
-    if (noData_.empty()) std::fill_n(result.output.Data(), result.output.Size(), std::byte{0});
+    // What nothing covers must not show another window's pixels.
+    std::fill_n(result.output.Data(), result.output.Size(), std::byte{0});
   }
 
   void ReadSource(Slot& slot, const Window& part) {

@@ -13,23 +13,24 @@ namespace zarn::processes::filters {
 ///
 /// | | |
 /// |---|---|
-/// | sample types | integers up to 32 bits, float, double; the same for labels, in any combination
-/// | | window | the cells of the structuring kernel; a kernel without cells writes nothing | |
-/// input margins | any; neighbours beyond them do not exist. They are read as they are | | output
-/// size | equal width; the input may be taller, rows past the lower margin of the output's
-///   height are not read |
-/// | labels | one channel, whose pixel (x / attrScale, y / attrScale), rounded towards zero, holds
-///   the label of pixel (x, y); its margins must reach as far as neighbours exist |
-/// | pooled | neighbours that exist, share the centre's label, have no mask byte 0 and are not
-///   no-data; whether the centre itself is among them does not matter |
-/// | written | pixels with a pool; all others, and those with output mask byte 0, keep what the
-///   output holds |
-/// | parallel | over rows, with dynamic adjustment of the thread count switched on; the result does
-///   not depend on it |
-/// | failures | unknown types, as each filter says; "Input and output rasters must be the same size
-///   (excluding margins).", also when the attribute raster does not cover the output or the scale
-///   is not positive; "Attribute raster margins are too small."; another sample type or channel
-///   count, more channels of labels, inconsistent or overlapping blocks |
+/// | types | integers up to 32 bits, float, double, for samples and labels in any combination |
+/// | window | the cells of the structuring kernel; one without cells writes nothing |
+/// | input margins | any; neighbours beyond them do not exist |
+/// | output size | equal width; the input may be taller |
+/// | labels | one channel; see below |
+/// | written | pixels with a pool whose output mask byte is not 0; all others are untouched |
+/// | parallel | over rows, with dynamic adjustment switched on; the result does not depend on it |
+///
+/// Pixel (x, y) has the label of pixel (x / attrScale, y / attrScale), rounded towards zero, of the
+/// attribute raster, whose margins must reach as far as neighbours exist. Pooled are neighbours
+/// that exist, share the centre's label, have no mask byte 0 and are not no-data; whether the
+/// centre itself is among them does not matter. Rows of a taller input past the lower margin of the
+/// output's height do not exist.
+///
+/// Refused are unknown types, as each filter says; "Input and output rasters must be the same size
+/// (excluding margins).", also when the attribute raster does not cover the output or the scale is
+/// not positive; "Attribute raster margins are too small."; another sample type or channel count,
+/// more channels of labels, inconsistent or overlapping blocks.
 ///
 /// Failures come back as code 0 with the output untouched; exceptions come only from allocation.
 /// Processing changes nothing in the filter: one object may serve several threads at once, each

@@ -12,6 +12,7 @@
 #include "processes/filters/attribute/pooling.h"
 #include "processes/filters/attribute/poolplanes_simd.h"
 #include "processes/filters/attribute/poolstatistics_simd.h"
+#include "processes/filters/framework/includedpixels.h"
 #include "processes/filters/framework/orderedkeys.h"
 #include "processes/filters/framework/samplerows_simd.h"
 #include "processes/filters/framework/sortingnetwork.h"
@@ -135,7 +136,6 @@ struct PoolScratch {
   OrderedKey<T>* keys;
   T* results;
   T* joined;
-  T* old;
   std::uint8_t* kept;
   std::byte* work;
 
@@ -182,7 +182,6 @@ struct PoolScratch {
     s.keys = take(std::type_identity<OrderedKey<T>>(), segment);
     s.results = take(samples, segment * plan.Channels());
     s.joined = take(samples, segment * plan.Channels());
-    s.old = take(samples, segment * plan.Channels());
     s.kept = take(bytes, segment);
     s.work = take(std::type_identity<std::byte>(), PoolWorkBytes(plan.Cells()));
     return s;
@@ -322,10 +321,17 @@ class PoolBand {
       std::memcpy(out, scratch_.results, samples * sizeof(T));
       return;
     }
-    if (any) std::memcpy(scratch_.old, out, samples * sizeof(T));
-    JoinChannels(scratch_.results, plan_.SegmentPitch(), count, plan_.Channels(),
-                 any ? scratch_.kept : nullptr, scratch_.old, scratch_.joined);
-    std::memcpy(out, scratch_.joined, samples * sizeof(T));
+    const std::size_t channels = plan_.Channels();
+    const T* const joined = scratch_.joined;
+    JoinChannels(scratch_.results, plan_.SegmentPitch(), count, channels, scratch_.joined);
+    if (!any) {
+      std::memcpy(out, joined, samples * sizeof(T));
+      return;
+    }
+    // Kept pixels are not even written as they were: others may be writing there.
+    ForEachIncluded(scratch_.kept, count, [&](std::size_t first, std::size_t last) {
+      std::copy(joined + first * channels, joined + last * channels, out + first * channels);
+    });
   }
 
   const PoolingJob<T>& job_;

@@ -18,8 +18,7 @@ bool CoversOutput(const gobs::RasterInfo& attr, std::int64_t scale, const gobs::
 bool CoversNeighbours(std::int64_t labels, std::int64_t labelMargin, std::int64_t scale,
                       std::int64_t pixels, std::int64_t inputMargin, std::int64_t reach) {
   const std::int64_t beyond = std::min(inputMargin, reach);
-  return pixels == 0 ||
-         (beyond / scale <= labelMargin && (pixels - 1 + beyond) / scale < labels + labelMargin);
+  return beyond / scale <= labelMargin && (pixels - 1 + beyond) / scale < labels + labelMargin;
 }
 
 }  // namespace
@@ -58,10 +57,11 @@ blockchecks::Refusal CheckPoolCall(const PoolCall& call, const std::vector<PoolO
   }
   if (useAttributes && !offsets.empty()) {
     const PoolReach reach = ReachOf(offsets);
-    if (!CoversNeighbours(attr.Width(), attr.MarginX(), scale, out.Width(), in.MarginX(),
-                          reach.x) ||
-        !CoversNeighbours(attr.Height(), attr.MarginY(), scale, out.Height(), in.MarginY(),
-                          reach.y)) {
+    const bool anyPixels = out.Width() > 0 && out.Height() > 0;
+    if (anyPixels && (!CoversNeighbours(attr.Width(), attr.MarginX(), scale, out.Width(),
+                                        in.MarginX(), reach.x) ||
+                      !CoversNeighbours(attr.Height(), attr.MarginY(), scale, out.Height(),
+                                        in.MarginY(), reach.y))) {
       return FilterResult::Failure(kAttributeMarginsTooSmall);
     }
   }

@@ -37,7 +37,7 @@ HWY_ATTR void Split(const T* pixels, std::size_t count, std::size_t channels, T*
 
 template <typename T>
 HWY_ATTR void Join(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
-                   const std::uint8_t* kept, const T* old, T* pixels) {
+                   T* pixels) {
   const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
     constexpr std::size_t kChannels = constant();
     const hn::ScalableTag<T> d;
@@ -46,20 +46,12 @@ HWY_ATTR void Join(const T* planes, std::size_t pitch, std::size_t count, std::s
       for (std::size_t c = 0; c < kChannels; ++c) {
         v.channel[c] = hn::LoadU(d, planes + c * pitch + i);
       }
-      if (kept != nullptr) {
-        v.Replace(LoadFlags(d, kept + i),
-                  PixelVectors<hn::ScalableTag<T>, kChannels>(d, old + i * kChannels));
-      }
       v.Store(pixels + i * kChannels);
     }
   });
   if (done) return;
-  for (std::size_t i = 0; i < count; ++i) {
-    const bool keep = kept != nullptr && kept[i] != 0;
-    for (std::size_t c = 0; c < channels; ++c) {
-      const std::size_t at = i * channels + c;
-      pixels[at] = keep ? old[at] : planes[c * pitch + i];
-    }
+  for (std::size_t c = 0; c < channels; ++c) {
+    for (std::size_t i = 0; i < count; ++i) pixels[i * channels + c] = planes[c * pitch + i];
   }
 }
 
@@ -70,8 +62,8 @@ HWY_ATTR void Join(const T* planes, std::size_t pitch, std::size_t count, std::s
     Split(pixels, count, channels, planes, pitch);                                             \
   }                                                                                            \
   void Join##name(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels, \
-                  const std::uint8_t* kept, const T* old, T* pixels) {                         \
-    Join(planes, pitch, count, channels, kept, old, pixels);                                   \
+                  T* pixels) {                                                                 \
+    Join(planes, pitch, count, channels, pixels);                                              \
   }
 #define ZARN_SAMPLE_TYPES(macro)                                                         \
   macro(UInt8, std::uint8_t) macro(Int8, std::int8_t) macro(UInt16, std::uint16_t)       \
@@ -88,19 +80,18 @@ namespace zarn::processes::filters {
 
 // Explicit specialisations are exported unless told otherwise.
 #define ZARN_HIDDEN __attribute__((visibility("hidden")))
-#define ZARN_PLANE_ENTRIES(name, T)                                                           \
-  HWY_EXPORT(Split##name);                                                                    \
-  HWY_EXPORT(Join##name);                                                                     \
-  template <>                                                                                 \
-  ZARN_HIDDEN void SplitChannels(const T* pixels, std::size_t count, std::size_t channels,    \
-                                 T* planes, std::size_t pitch) {                              \
-    HWY_DYNAMIC_DISPATCH(Split##name)(pixels, count, channels, planes, pitch);                \
-  }                                                                                           \
-  template <>                                                                                 \
-  ZARN_HIDDEN void JoinChannels(const T* planes, std::size_t pitch, std::size_t count,        \
-                                std::size_t channels, const std::uint8_t* kept, const T* old, \
-                                T* pixels) {                                                  \
-    HWY_DYNAMIC_DISPATCH(Join##name)(planes, pitch, count, channels, kept, old, pixels);      \
+#define ZARN_PLANE_ENTRIES(name, T)                                                        \
+  HWY_EXPORT(Split##name);                                                                 \
+  HWY_EXPORT(Join##name);                                                                  \
+  template <>                                                                              \
+  ZARN_HIDDEN void SplitChannels(const T* pixels, std::size_t count, std::size_t channels, \
+                                 T* planes, std::size_t pitch) {                           \
+    HWY_DYNAMIC_DISPATCH(Split##name)(pixels, count, channels, planes, pitch);             \
+  }                                                                                        \
+  template <>                                                                              \
+  ZARN_HIDDEN void JoinChannels(const T* planes, std::size_t pitch, std::size_t count,     \
+                                std::size_t channels, T* pixels) {                         \
+    HWY_DYNAMIC_DISPATCH(Join##name)(planes, pitch, count, channels, pixels);              \
   }
 ZARN_SAMPLE_TYPES(ZARN_PLANE_ENTRIES)
 

@@ -12,10 +12,9 @@ template <typename T>
 void SplitChannels(const T* pixels, std::size_t count, std::size_t channels, T* planes,
                    std::size_t pitch);
 
-/// The inverse, but for the flagged pixels, which are those of `old` instead; `kept` is null when
-/// there are none. All rows are padded likewise.
+/// The inverse; all rows are padded likewise.
 template <typename T>
 void JoinChannels(const T* planes, std::size_t pitch, std::size_t count, std::size_t channels,
-                  const std::uint8_t* kept, const T* old, T* pixels);
+                  T* pixels);
 
 }  // namespace zarn::processes::filters
