@@ -161,7 +161,7 @@ FilterResult CPUCutlineBlending::Process(const gobs::Raster& input, gobs::Raster
               std::int64_t{sourceMapChannel} > std::int64_t{sourceMap->Channels()}) {
             return FilterResult::Failure(kMapSize);
           }
-          const FilterResult known =
+          FilterResult known =
               VisitSampleType(ComponentCode(*sourceMap), messages::kUnknownBalancedType,
                               [&]<typename M>(std::type_identity<M>) {
                                 if (sourceMapChannel >= 1 && sourceMapValue >= 1) {

@@ -75,7 +75,8 @@ void MeanNSigmaTrimMethod::Trim(const std::uint64_t* histogram, double leftTrim,
   for (auto i = static_cast<unsigned int>(low); i < end; ++i) {
     pixels += histogram[i];
     sum += i * histogram[i];
-    squares += i * i * histogram[i];  // the square is one of 32 bits
+    const unsigned int square = i * i;  // in 32 bits
+    squares += square * histogram[i];
   }
   const std::int64_t n = AsSigned(pixels);
   if (n == 0) return;

@@ -44,7 +44,9 @@ class ITrimMethod {
   ~ITrimMethod() = default;
 };
 
-class PercentTrimMethod final : public ITrimMethod {
+// Final, so that destroying it as what it is needs no virtual destructor.
+class PercentTrimMethod final  // NOLINT(cppcoreguidelines-virtual-class-destructor)
+    : public ITrimMethod {
  public:
   void Trim(const std::uint64_t* histogram, double leftTrim, double rightTrim,
             unsigned int binCount, bool ignoreFirstBin, bool ignoreLastBin, std::int64_t total,
@@ -54,7 +56,8 @@ class PercentTrimMethod final : public ITrimMethod {
 
 /// Integer arithmetic throughout: mean and deviation are whole grey levels. Sums wrap around at
 /// 2^64. A histogram without pixels keeps its whole range.
-class MeanNSigmaTrimMethod final : public ITrimMethod {
+class MeanNSigmaTrimMethod final  // NOLINT(cppcoreguidelines-virtual-class-destructor)
+    : public ITrimMethod {
  public:
   void Trim(const std::uint64_t* histogram, double leftTrim, double rightTrim,
             unsigned int binCount, bool ignoreFirstBin, bool ignoreLastBin, std::int64_t total,
