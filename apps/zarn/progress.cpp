@@ -19,7 +19,7 @@ TerminalProgress::~TerminalProgress() {
   if (active_ && shown_ >= 0 && shown_ < kTicks) std::fputc('\n', stderr);
 }
 
-void TerminalProgress::Update(double fraction) {
+void TerminalProgress::Report(double fraction, const std::string& /*step*/) {
   if (!active_) return;
   const int reached = std::clamp(static_cast<int>(fraction * kTicks), 0, kTicks);
   while (shown_ < reached) {

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <string>
+
 #include "host/nspio/counter.h"
 
 namespace zarn::app {
@@ -12,7 +14,8 @@ class TerminalProgress : public nspio::Counter {
   /// Ends a line that was begun, so that what is printed next starts on its own.
   ~TerminalProgress() override;
 
-  void Update(double fraction) override;
+ protected:
+  void Report(double fraction, const std::string& step) override;
 
  private:
   bool active_;
@@ -24,7 +27,11 @@ class ProgressSpan : public nspio::Counter {
  public:
   ProgressSpan(nspio::Counter& whole, double begin, double end)
       : whole_(whole), begin_(begin), end_(end) {}
-  void Update(double fraction) override { whole_.Update(begin_ + fraction * (end_ - begin_)); }
+
+ protected:
+  void Report(double fraction, const std::string& step) override {
+    whole_.Update(begin_ + fraction * (end_ - begin_), step);
+  }
 
  private:
   nspio::Counter& whole_;

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <string>
+
 #include "host/hostexport.h"
 
 namespace zarn::nspio {
@@ -14,8 +16,12 @@ class ZARN_HOST_EXPORT Counter {
   Counter& operator=(const Counter&) = delete;
   virtual ~Counter();
 
-  /// `fraction` of the work done, 0 to 1, never decreasing.
-  virtual void Update(double fraction) = 0;
+  /// `fraction` of the work done, 0 to 1, never decreasing within a step; `step` names what is
+  /// being done, where the work has several steps.
+  void Update(double fraction, const std::string& step = std::string()) { Report(fraction, step); }
+
+ protected:
+  virtual void Report(double fraction, const std::string& step) = 0;
 };
 
 }  // namespace zarn::nspio
