@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/dodge.h"
 
+#include <CLI/CLI.hpp>
 #include <filesystem>
 #include <memory>
 #include <optional>

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/hotspot.h"
 
+#include <CLI/CLI.hpp>
 #include <cstdint>
 #include <memory>
 #include <optional>

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/kerneloptions.h"
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
 
 #include "apps/zarn/imagefilter.h"

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstdint>
 #include <string>
 
+#include "apps/zarn/commandline.h"
 #include "apps/zarn/dataset.h"
 #include "processes/filters/framework/structuringkernel.h"
 

@@ -1,11 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
+
+#include "apps/zarn/commandline.h"
 
 namespace zarn::app {
 

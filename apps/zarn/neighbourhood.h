@@ -1,13 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstdint>
 #include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 
+#include "apps/zarn/commandline.h"
 #include "apps/zarn/imagefilter.h"
 #include "processes/filters/framework/ifilter.h"
 

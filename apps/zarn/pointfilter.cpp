@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/pointfilter.h"
 
+#include <CLI/CLI.hpp>
 #include <iostream>
 
 #include "apps/zarn/errors.h"

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <functional>
 #include <memory>
 #include <string>
 
+#include "apps/zarn/commandline.h"
 #include "apps/zarn/imagefilter.h"
 
 namespace zarn::app {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/polynomial.h"
 
+#include <CLI/CLI.hpp>
 #include <memory>
 #include <string>
 #include <vector>

@@ -3,6 +3,7 @@
 
 #include <cpl_error.h>
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cmath>
 #include <cstdint>

@@ -6,6 +6,7 @@
 #include <gdal_priv.h>
 #include <ogrsf_frmts.h>
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
 #include <array>
 #include <cstdint>

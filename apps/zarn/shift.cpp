@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/shift.h"
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cstdint>
 #include <memory>

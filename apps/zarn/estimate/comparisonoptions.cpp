@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/estimate/comparisonoptions.h"
 
+#include <CLI/CLI.hpp>
+
 namespace zarn::app {
 
 void AddGainLimitOptions(CLI::App& command, GainLimits& limits) {

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <string>
 
+#include "apps/zarn/commandline.h"
 #include "apps/zarn/estimate/gainoffsetnetwork.h"
 
 namespace zarn::app {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/estimate/fitgainoffset.h"
 
+#include <CLI/CLI.hpp>
 #include <cstdio>
 #include <filesystem>
 #include <memory>

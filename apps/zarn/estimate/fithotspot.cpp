@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/estimate/fithotspot.h"
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cstdio>
 #include <memory>
