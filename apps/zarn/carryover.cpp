@@ -51,6 +51,7 @@ CPLStringList WithoutStatistics(char** items) {
 
 void CopyBand(GDALRasterBand& source, GDALRasterBand& output) {
   if (source.GetDescription()[0] != '\0') output.SetDescription(source.GetDescription());
+  if (GDALColorTable* const palette = source.GetColorTable()) output.SetColorTable(palette);
   const GDALColorInterp colour = source.GetColorInterpretation();
   if (colour != GCI_Undefined && colour != output.GetColorInterpretation()) {
     output.SetColorInterpretation(colour);

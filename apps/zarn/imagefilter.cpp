@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/imagefilter.h"
 
+#include <CLI/CLI.hpp>
 #include <charconv>
 #include <filesystem>
 #include <system_error>
@@ -136,10 +137,10 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
   const std::optional<WindowSize> forcedWindow = ParseWindow(options.window);
 
   const RasterSource source(options.input);
-  source.RefusePalette();
+  if (maker.computes) source.RefusePalette();
   RequireSampleType(source, maker.probe(source));
   NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
-  if (!maker.knowsNoData) noData.input.clear();
+  if (!maker.computes) noData.input.clear();
   const FittedFilter fitted = maker.fit(source, noData);
   std::optional<MaskFile> mask;
   if (!options.mask.empty()) {

@@ -1,13 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstdint>
 #include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 
+#include "apps/zarn/commandline.h"
 #include "apps/zarn/dataset.h"
 #include "apps/zarn/labelfile.h"
 #include "apps/zarn/maskfile.h"
@@ -77,9 +77,9 @@ struct FilterMaker {
   std::function<WindowFilter(const RasterSource&)> probe;
   /// The filter that does the work.
   std::function<FittedFilter(const RasterSource&, const NoDataValues&)> fit;
-  /// Whether no-data values mean anything to the filter; else they are values like all others,
-  /// and the output declares those of the input.
-  bool knowsNoData = true;
+  /// Whether the filter computes with samples as amounts. Else a palette is no hindrance, and
+  /// no-data values are values like all others; the output declares those of the input.
+  bool computes = true;
 };
 
 /// Filters the input file into the output file. Throws `UsageError` and `RunError`.

@@ -125,29 +125,35 @@ CoarserGrid GridOf(GDALDataset& labels, const std::string& name, const RasterSou
   return *grid;
 }
 
-// The next wider integers; other types stay.
+// A signed type that holds all labels of a type, their differences, and a value that is none of
+// them; other types stay.
 template <typename Sample>
 struct Wider : std::type_identity<Sample> {};
 template <>
-struct Wider<std::uint8_t> : std::type_identity<std::uint16_t> {};
+struct Wider<std::uint8_t> : std::type_identity<std::int16_t> {};
 template <>
 struct Wider<std::int8_t> : std::type_identity<std::int16_t> {};
 template <>
-struct Wider<std::uint16_t> : std::type_identity<std::uint32_t> {};
+struct Wider<std::uint16_t> : std::type_identity<std::int32_t> {};
 template <>
 struct Wider<std::int16_t> : std::type_identity<std::int32_t> {};
+template <>
+struct Wider<std::uint32_t> : std::type_identity<double> {};
+template <>
+struct Wider<std::int32_t> : std::type_identity<double> {};
 
 NativeDataTypeCode WiderCode(NativeDataTypeCode code) {
   using enum NativeDataTypeCode;
   switch (code) {
     case kUInt8:
-      return kUInt16;
     case kInt8:
       return kInt16;
     case kUInt16:
-      return kUInt32;
     case kInt16:
       return kInt32;
+    case kUInt32:
+    case kInt32:
+      return kFloat64;
     default:
       return code;
   }
@@ -155,7 +161,8 @@ NativeDataTypeCode WiderCode(NativeDataTypeCode code) {
 
 }  // namespace
 
-LabelFile::LabelFile(const std::string& name, const RasterSource& image, const std::string& noData)
+LabelFile::LabelFile(const std::string& name, const RasterSource& image, const std::string& noData,
+                     LabelComparison comparison)
     : name_(name),
       dataset_(OpenRaster(name)),
       fileType_(SampleTypeOf(*dataset_->GetRasterBand(1))) {
@@ -168,10 +175,10 @@ LabelFile::LabelFile(const std::string& name, const RasterSource& image, const s
     throw RunError("the labels " + name + " are " + fileType_.Name() + "; give real numbers");
   }
   grid_ = GridOf(*dataset_, name, image);
-  SettleNoData(noData);
+  SettleNoData(noData, comparison);
 }
 
-void LabelFile::SettleNoData(const std::string& option) {
+void LabelFile::SettleNoData(const std::string& option, LabelComparison comparison) {
   std::optional<double> value;
   if (option.empty()) {
     int declared = FALSE;
@@ -188,17 +195,15 @@ void LabelFile::SettleNoData(const std::string& option) {
     value.reset();
   }
   // Without such a label, one that no pixel can have stands in.
-  isWidened_ = !value && WiderCode(fileType_.code) != fileType_.code;
+  isWidened_ = !value || comparison == LabelComparison::kDifference;
   type_ = isWidened_ ? WiderCode(fileType_.code) : fileType_.code;
   bytes_ = gobs::NativeDataType(type_).Description().BytesPerSample();
   if (value) {
     noData_ = *value;
-  } else if (GDALDataTypeIsFloating(fileType_.gdal) != FALSE) {
+  } else if (type_ == NativeDataTypeCode::kFloat32 || type_ == NativeDataTypeCode::kFloat64) {
     noData_ = std::numeric_limits<double>::quiet_NaN();
   } else {
-    noData_ = gobs::DataTypeAdapter::MinValue(type_) < 0 ? gobs::DataTypeAdapter::MinValue(type_)
-                                                         : gobs::DataTypeAdapter::MaxValue(type_);
-    isReserved_ = !isWidened_;
+    noData_ = gobs::DataTypeAdapter::MinValue(type_);
   }
 }
 
@@ -249,13 +254,6 @@ void LabelFile::RepeatRow(std::int64_t coarseRow, std::int64_t coarseLeft, const
   const std::int64_t coarseWidth = (first + area.width - 1) / grid_.factor + 1 - coarseLeft;
   const auto* const row =
       reinterpret_cast<const Sample*>(scratch_.data()) + coarseRow * coarseWidth;
-  if (isReserved_) {
-    const auto reserved = static_cast<Sample>(noData_);
-    if (std::find(row, row + coarseWidth, reserved) != row + coarseWidth) {
-      throw RunError("the label " + std::to_string(reserved) + " of " + name_ +
-                     " is not supported; name the label of pixels without one with --label-nodata");
-    }
-  }
   auto* const to = reinterpret_cast<Label*>(labels);
   if (grid_.factor == 1) {
     std::transform(row, row + coarseWidth, to, [](Sample s) { return static_cast<Label>(s); });

@@ -20,6 +20,12 @@ struct CoarserGrid {
   std::int64_t offsetY = 0;
 };
 
+/// What decides whether two labels are of the same segment.
+enum class LabelComparison {
+  kEquality,
+  kDifference,  ///< up to a tolerance, to either side
+};
+
 /// A raster of one band that gives each pixel of an image a label. It may be coarser than the image
 /// by a whole number; its labels are handed out repeated, one for each pixel of the image, so that
 /// nothing depends on where a window begins.
@@ -28,11 +34,12 @@ class LabelFile {
   /// `noData` is the label of pixels without one, "none", or empty for the file's own. Throws
   /// `RunError` unless the file has one band of real numbers whose grid fits that of `image`, and
   /// `UsageError` when `noData` is no number.
-  LabelFile(const std::string& name, const RasterSource& image, const std::string& noData);
+  LabelFile(const std::string& name, const RasterSource& image, const std::string& noData,
+            LabelComparison comparison);
 
   const std::string& Name() const { return name_; }
-  /// Of the labels that are handed out: one that can hold `NoData`, where there is none in the
-  /// file's own type.
+  /// Of the labels that are handed out: the file's own, or one that also holds the differences of
+  /// its labels, with their signs, or a `NoData` that is none of them.
   gobs::NativeDataTypeCode Type() const { return type_; }
   std::size_t Bytes() const { return bytes_; }
   /// The label that means none. No pixel has it when there is no such label.
@@ -42,7 +49,7 @@ class LabelFile {
   void Read(const Window& area, std::byte* labels, std::size_t stride);
 
  private:
-  void SettleNoData(const std::string& option);
+  void SettleNoData(const std::string& option, LabelComparison comparison);
   void ReadPart(const Window& coarse);
   template <typename Sample, typename Label>
   void RepeatRow(std::int64_t coarseRow, std::int64_t coarseLeft, const Window& area,
@@ -53,7 +60,6 @@ class LabelFile {
   SampleType fileType_;
   CoarserGrid grid_;
   bool isWidened_ = false;
-  bool isReserved_ = false;  ///< `NoData` must not occur in the file
   gobs::NativeDataTypeCode type_ = gobs::NativeDataTypeCode::kNone;
   std::size_t bytes_ = 0;
   double noData_ = 0;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/morph.h"
 
+#include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cstdint>
 #include <memory>
@@ -182,7 +183,7 @@ void Run(const MorphOptions& options) {
                                            OnWindows(options, options.kernel.For(source)),
                                            options.kernel.Halo(source, steps)};
                                      },
-                                 .knowsNoData = false});
+                                 .computes = false});
 }
 
 }  // namespace

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <CLI/CLI.hpp>
+#include "apps/zarn/commandline.h"
 
 namespace zarn::app {
 

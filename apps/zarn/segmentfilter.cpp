@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/segmentfilter.h"
 
+#include <CLI/CLI.hpp>
 #include <memory>
 #include <string>
 #include <utility>
@@ -70,7 +71,9 @@ FittedFilter FitFilter(const SegmentFilterOptions& options, const RasterSource& 
   FittedFilter fitted;
   FilterPtr filter = MakeFilter(options, options.kernel.For(source));
   if (!options.labels.empty()) {
-    fitted.labels = std::make_unique<LabelFile>(options.labels, source, options.labelNoData);
+    fitted.labels = std::make_unique<LabelFile>(
+        options.labels, source, options.labelNoData,
+        options.labelTolerance > 0 ? LabelComparison::kDifference : LabelComparison::kEquality);
     RequireLabelType(options, *fitted.labels);
     filter->useAttributes = true;
     filter->attrNoDataValue = fitted.labels->NoData();
@@ -115,9 +118,9 @@ void AddSegmentFilterCommand(CLI::App& app) {
                       "IN or coarser by a whole number; without it all pixels are of one segment")
           ->type_name("FILE");
   command
-      .add_option("--label-tolerance", options->labelTolerance,
-                  "Neighbours whose label is up to V larger (signed and floating-point labels: or "
-                  "smaller) count as of the same segment")
+      .add_option(
+          "--label-tolerance", options->labelTolerance,
+          "Neighbours whose label is up to V larger or smaller count as of the same segment")
       ->type_name("V")
       ->check(CLI::Validator(
           [](const std::string& text) {

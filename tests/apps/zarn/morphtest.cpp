@@ -147,10 +147,16 @@ TEST_F(Morph, KeepsAndReplacesValuesAsAsked) {
   }
 }
 
-TEST_F(Morph, IgnoresMaskedPixelsButNotNoData) {
+TEST_F(Morph, IgnoresMaskedPixelsAndCarriesPaletteAndNoData) {
   Image image(6, 1, 1, GDT_Byte);
   image.values = {1, 0, 1, 0, 1, 0};
-  Write(image, folder_ / "in.tif", {}, DeclareNoData(0));
+  Write(image, folder_ / "in.tif", {}, [](GDALDataset& dataset) {
+    GDALColorTable table;
+    const GDALColorEntry red{255, 0, 0, 255};
+    table.SetColorEntry(1, &red);
+    dataset.GetRasterBand(1)->SetColorTable(&table);
+    DeclareNoData(0)(dataset);
+  });
   Image mask(6, 1, 1, GDT_Byte);
   mask.values = {1, 0, 1, 1, 0, 1};
   Write(mask, folder_ / "mask.tif");
@@ -161,7 +167,10 @@ TEST_F(Morph, IgnoresMaskedPixelsButNotNoData) {
             (Row{1, 0, 1, 1, 1, 0}));
   const Image grown = Filter({"--op", "dilate", "--match", "1"});
   EXPECT_EQ(grown.values, Row(6, 1));
-  EXPECT_EQ(OpenImage(folder_ / "out.tif")->GetRasterBand(1)->GetNoDataValue(), 0);
+  const OpenDataset output = OpenImage(folder_ / "out.tif");
+  EXPECT_EQ(output->GetRasterBand(1)->GetNoDataValue(), 0);
+  ASSERT_NE(output->GetRasterBand(1)->GetColorTable(), nullptr);
+  EXPECT_EQ(output->GetRasterBand(1)->GetColorTable()->GetColorEntry(1)->c1, 255);
 }
 
 TEST_F(Morph, RefusesWhatMakesNoSense) {
