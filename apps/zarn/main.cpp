@@ -11,6 +11,7 @@
 
 #include "apps/zarn/average.h"
 #include "apps/zarn/dodge.h"
+#include "apps/zarn/enhance.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/estimate/fitdodging.h"
 #include "apps/zarn/estimate/fitgainoffset.h"
@@ -52,6 +53,7 @@ void AddCommands(CLI::App& app) {
       "'zarn COMMAND --help' shows the options of a command.\n\n"
       "Example:\n  zarn average --size 5 scene.tif smooth.tif");
   zarn::app::AddAverageCommand(app);
+  zarn::app::AddEnhanceCommand(app);
   zarn::app::AddFitDodgingCommand(app);
   zarn::app::AddFitGainOffsetCommand(app);
   zarn::app::AddFitHotSpotCommand(app);

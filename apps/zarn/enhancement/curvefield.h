@@ -1,0 +1,68 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <vector>
+
+#include "host/gobs/raster.h"
+#include "processes/filters/enhancement/igeolutmatrix.h"
+#include "processes/filters/enhancement/powercurve.h"
+
+namespace zarn::app {
+
+enum class CellBlending {
+  kNone,      ///< every pixel by the curve of its own cell
+  kBilinear,  ///< by the curves of the four cells whose centres are around it
+};
+
+/// Enhances the pixels of an image by the curves of a grid of cells.
+///
+/// Blended, a pixel becomes the bilinear mean of what the curves of the four nearest cells make of
+/// it, by the distances of its centre to theirs; beyond the outermost centres the nearest cells
+/// count alone. All is computed in single precision and rounded half up. The place of a pixel is
+/// that in the whole image, so that nothing depends on windows.
+template <typename T>
+class CurveField {
+ public:
+  using Curve = processes::filters::PowerCurve;
+
+  CurveField(const processes::filters::IGeoLUTMatrix& matrix, CellBlending blending);
+
+  /// Enhances a block without margins. Pixels whose byte in `valid` is 0 are left alone; `valid`
+  /// may be null. An enhanced pixel that is `noData` (one value for each channel, or null) in all
+  /// channels becomes its neighbour in the first one.
+  void Apply(const gobs::Raster& input, const std::uint8_t* valid, const T* noData,
+             gobs::Raster& output) const;
+
+ private:
+  /// The cells before and after a pixel along an axis, and the weight of the latter.
+  struct Place {
+    std::uint32_t first;
+    std::uint32_t second;
+    float weight;
+  };
+  struct Columns;
+  struct Scratch;
+
+  Place PlaceOf(std::uint64_t position, std::uint32_t tile, std::uint32_t cells) const;
+  Columns PlaceColumns(const gobs::Raster& block) const;
+  std::array<Curve, 4> Corners(const Place& row, const Place& column, std::size_t channel) const;
+  void EnhanceRow(const T* samples, const std::uint8_t* valid, const T* noData, const Place& row,
+                  const Columns& columns, Scratch& scratch, T* results) const;
+
+  std::uint32_t tileWidth_;
+  std::uint32_t tileHeight_;
+  std::uint32_t rows_;
+  std::uint32_t columns_;
+  std::size_t channels_;
+  CellBlending blending_;
+  std::vector<float> powers_;
+  std::vector<Curve> curves_;  ///< cell by cell, the channels of each
+};
+
+extern template class CurveField<std::uint8_t>;
+extern template class CurveField<std::uint16_t>;
+
+}  // namespace zarn::app
