@@ -53,7 +53,9 @@ need() {
     fail "could not install ${missing[*]}"
 }
 
-# Configures and builds a preset.
+# Configures and builds a preset. What another clone has compiled serves this one, where there is
+# ccache: names of files count from the root.
+export CCACHE_BASEDIR=$PWD CCACHE_NOHASHDIR=1
 build() {
   local preset=$1
   echo "Building build/$preset"
