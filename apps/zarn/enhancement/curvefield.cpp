@@ -2,6 +2,7 @@
 #include "apps/zarn/enhancement/curvefield.h"
 
 #include <algorithm>
+#include <numeric>
 
 #include "host/sys/parallel.h"
 #include "host/sys/vectorised.h"
@@ -13,63 +14,79 @@ namespace filters = processes::filters;
 namespace parallel = sys::parallel;
 using filters::PowerCurve;
 
-/// A run of samples of one channel between the same four cells.
-struct BlendRun {
-  std::size_t count;
-  const std::int32_t* levels;
-  const float* weights;              ///< of the cells on the right, one for each sample
-  float rowWeight;                   ///< of the cells below
-  std::array<PowerCurve, 4> curves;  ///< above left and right, below left and right
-  const float* powers;
-  float top;
-  std::int32_t* results;
-};
+constexpr std::size_t kByteLevels = 256;
 
-// `filters::CurveValue`, as a number.
-inline float Value(const PowerCurve& curve, const float* powers, float top, std::int32_t level) {
-  const std::int32_t above = std::max(level - curve.low, 0);
-  float value = curve.gain * powers[above];
-  value = value > top ? top : value;
-  value = value > 0.0F ? value : 0.0F;  // not so for NaN
-  value = static_cast<float>(static_cast<std::int32_t>(value));
-  value = level < curve.low ? 0.0F : value;
-  return level >= curve.high ? top : value;
+// Samples of one channel as numbers.
+template <typename T>
+void TakeLevels(const T* samples, std::size_t channels, std::size_t count, std::int32_t* levels) {
+  for (std::size_t i = 0; i < count; ++i) levels[i] = samples[i * channels];
 }
 
-ZARN_VECTORISED void Blend(const BlendRun& run) {
-  const PowerCurve c0 = run.curves[0];
-  const PowerCurve c1 = run.curves[1];
-  const PowerCurve c2 = run.curves[2];
-  const PowerCurve c3 = run.curves[3];
-  const float* const powers = run.powers;
-  const float* const weights = run.weights;
-  const std::int32_t* const levels = run.levels;
-  std::int32_t* const results = run.results;
-  const float rowWeight = run.rowWeight;
-  const float top = run.top;
-#pragma GCC ivdep
-  for (std::size_t i = 0; i < run.count; ++i) {
-    const std::int32_t level = levels[i];
-    const float a = Value(c0, powers, top, level);
-    const float b = Value(c1, powers, top, level);
-    const float c = Value(c2, powers, top, level);
-    const float d = Value(c3, powers, top, level);
-    const float above = a + (b - a) * weights[i];
-    const float below = c + (d - c) * weights[i];
-    results[i] = static_cast<std::int32_t>(above + (below - above) * rowWeight + 0.5F);
+template <typename T>
+void PutLevels(const std::int32_t* levels, const std::uint8_t* valid, std::size_t channels,
+               std::size_t count, T* samples) {
+  if (valid == nullptr) {
+    for (std::size_t i = 0; i < count; ++i) samples[i * channels] = static_cast<T>(levels[i]);
+    return;
+  }
+  for (std::size_t i = 0; i < count; ++i) {
+    T& sample = samples[i * channels];
+    sample = valid[i] != 0 ? static_cast<T>(levels[i]) : sample;
   }
 }
 
-// Where two cells are one, so are the curves.
-ZARN_VECTORISED void Follow(const BlendRun& run) {
-  const PowerCurve curve = run.curves[0];
-  const float* const powers = run.powers;
-  const std::int32_t* const levels = run.levels;
-  std::int32_t* const results = run.results;
-  const float top = run.top;
+// The powers of the levels above the beginnings of four curves; below them that of 0. Apart from
+// the arithmetic, because the compiler does not vectorise what has look-ups in it.
+void LookUpPowers(const std::array<PowerCurve, 4>& curves, const float* table,
+                  const std::int32_t* levels, std::size_t count, float* powers, std::size_t pitch) {
+  const std::array<std::int32_t, 4> lows{curves[0].low, curves[1].low, curves[2].low,
+                                         curves[3].low};
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::int32_t level = levels[i];
+    for (std::size_t k = 0; k < 4; ++k) {
+      powers[k * pitch + i] = table[level > lows[k] ? level - lows[k] : 0];
+    }
+  }
+}
+
+// The entries of two tables for each sample.
+template <typename T>
+void LookUpPairs(const float* left, const float* right, const T* samples, std::size_t channels,
+                 std::size_t count, float* leftEntries, float* rightEntries) {
+  for (std::size_t i = 0; i < count; ++i) {
+    const T level = samples[i * channels];
+    leftEntries[i] = left[level];
+    rightEntries[i] = right[level];
+  }
+}
+
+// `filters::CurveValue`, as a number and without branches, in the place of the powers.
+ZARN_VECTORISED void CurveValues(const PowerCurve& curve, float top, const std::int32_t* levels,
+                                 std::size_t count, float* values) {
+  const float gain = curve.gain;
+  const std::int32_t high = curve.high;
 #pragma GCC ivdep
-  for (std::size_t i = 0; i < run.count; ++i) {
-    results[i] = static_cast<std::int32_t>(Value(curve, powers, top, levels[i]));
+  for (std::size_t i = 0; i < count; ++i) {
+    const float least = levels[i] >= high ? top : 0.0F;
+    float value = gain * values[i];
+    value = value > least ? value : least;  // not so for NaN
+    value = value < top ? value : top;
+    values[i] = static_cast<float>(static_cast<std::int32_t>(value));
+  }
+}
+
+// What lies between two rows of values, at `weight` of the way.
+ZARN_VECTORISED void BlendRows(const float* above, const float* below, float weight,
+                               std::size_t count, float* blended) {
+#pragma GCC ivdep
+  for (std::size_t i = 0; i < count; ++i) blended[i] = above[i] + (below[i] - above[i]) * weight;
+}
+
+ZARN_VECTORISED void BlendColumns(const float* left, const float* right, const float* weights,
+                                  std::size_t count, std::int32_t* results) {
+#pragma GCC ivdep
+  for (std::size_t i = 0; i < count; ++i) {
+    results[i] = static_cast<std::int32_t>(left[i] + (right[i] - left[i]) * weights[i] + 0.5F);
   }
 }
 
@@ -81,19 +98,44 @@ void MoveOffNoData(const T* noData, std::size_t channels, T* pixel) {
 
 }  // namespace
 
-// The places of all columns of a block, and where runs between the same cells end.
 template <typename T>
-struct CurveField<T>::Columns {
-  std::vector<Place> places;
-  std::vector<float> weights;
-  std::vector<std::size_t> ends;
+struct CurveField<T>::Block {
+  const T* samples;
+  const std::uint8_t* valid;
+  const T* noData;
+  T* results;
+  std::size_t width;
+};
+
+/// Rows or columns between the same two cells.
+template <typename T>
+struct CurveField<T>::Run {
+  std::size_t begin;
+  std::size_t end;
+  std::uint32_t first;
+  std::uint32_t second;
 };
 
 template <typename T>
+struct CurveField<T>::Axis {
+  std::vector<Run> runs;
+  std::vector<float> weights;  ///< of the second cell, for each row or column
+};
+
+// Rows of numbers, each for a row of a tile or for all levels of a byte.
+template <typename T>
 struct CurveField<T>::Scratch {
-  explicit Scratch(std::size_t count) : levels(count), results(count) {}
+  explicit Scratch(std::size_t width)
+      : pitch(std::max(width, kByteLevels)), levels(pitch), floats(8 * pitch) {}
+  float* Corner(std::size_t corner) { return floats.data() + corner * pitch; }
+  float* Left() { return Corner(4); }
+  float* Right() { return Corner(5); }
+  float* LeftOfPixels() { return Corner(6); }
+  float* RightOfPixels() { return Corner(7); }
+
+  std::size_t pitch;
   std::vector<std::int32_t> levels;
-  std::vector<std::int32_t> results;
+  std::vector<float> floats;
 };
 
 template <typename T>
@@ -119,108 +161,123 @@ CurveField<T>::CurveField(const filters::IGeoLUTMatrix& matrix, CellBlending ble
 }
 
 template <typename T>
-typename CurveField<T>::Place CurveField<T>::PlaceOf(std::uint64_t position, std::uint32_t tile,
-                                                     std::uint32_t cells) const {
-  if (blending_ == CellBlending::kNone) {
-    const auto cell =
-        static_cast<std::uint32_t>(std::min<std::uint64_t>(position / tile, cells - 1));
-    return {cell, cell, 0.0F};
+typename CurveField<T>::Axis CurveField<T>::PlaceAlong(std::uint64_t origin, std::size_t count,
+                                                       std::uint32_t tile,
+                                                       std::uint32_t cells) const {
+  Axis axis;
+  const auto add = [&](std::uint64_t first, std::uint64_t second, float weight) {
+    const auto a = static_cast<std::uint32_t>(std::min<std::uint64_t>(first, cells - 1));
+    const auto b = static_cast<std::uint32_t>(std::min<std::uint64_t>(second, cells - 1));
+    const bool goesOn =
+        !axis.runs.empty() && axis.runs.back().first == a && axis.runs.back().second == b;
+    if (!goesOn) axis.runs.push_back({axis.weights.size(), 0, a, b});
+    axis.weights.push_back(a == b ? 0.0F : weight);
+    axis.runs.back().end = axis.weights.size();
+  };
+  for (std::uint64_t position = origin; position < origin + count; ++position) {
+    // In half pixels, from the centre of the first cell to that of the pixel.
+    const std::uint64_t step = 2 * std::uint64_t{tile};
+    const std::uint64_t halves = 2 * position + 1;
+    if (blending_ == CellBlending::kNone) {
+      add(position / tile, position / tile, 0);
+    } else if (halves <= tile) {
+      add(0, 0, 0);
+    } else {
+      const std::uint64_t first = (halves - tile) / step;
+      add(first, first + 1, static_cast<float>((halves - tile) % step) / static_cast<float>(step));
+    }
   }
-  // In half pixels from the centre of the first cell to that of the pixel.
-  const std::uint64_t twice = 2 * position + 1;
-  if (twice <= tile) return {0, 0, 0.0F};
-  const std::uint64_t halves = twice - tile;
-  const auto first = static_cast<std::uint32_t>(halves / (2 * std::uint64_t{tile}));
-  if (first + 1 >= cells) return {cells - 1, cells - 1, 0.0F};
-  const std::uint64_t rest = halves % (2 * std::uint64_t{tile});
-  return {first, first + 1, static_cast<float>(rest) / (2.0F * static_cast<float>(tile))};
+  return axis;
 }
 
 template <typename T>
-typename CurveField<T>::Columns CurveField<T>::PlaceColumns(const gobs::Raster& block) const {
-  Columns columns;
-  for (std::size_t x = 0; x < block.Width(); ++x) {
-    const Place place = PlaceOf(std::uint64_t{block.OriginX()} + x, tileWidth_, columns_);
-    const bool isNew = x > 0 && (place.first != columns.places.back().first ||
-                                 place.second != columns.places.back().second);
-    if (isNew) columns.ends.push_back(x);
-    columns.places.push_back(place);
-    columns.weights.push_back(place.weight);
-  }
-  columns.ends.push_back(block.Width());
-  return columns;
-}
-
-template <typename T>
-std::array<PowerCurve, 4> CurveField<T>::Corners(const Place& row, const Place& column,
+std::array<PowerCurve, 4> CurveField<T>::Corners(const Run& rows, const Run& columns,
                                                  std::size_t channel) const {
   const auto curve = [&](std::size_t r, std::size_t c) {
     return curves_[(r * columns_ + c) * channels_ + channel];
   };
-  return {curve(row.first, column.first), curve(row.first, column.second),
-          curve(row.second, column.first), curve(row.second, column.second)};
+  return {curve(rows.first, columns.first), curve(rows.second, columns.first),
+          curve(rows.first, columns.second), curve(rows.second, columns.second)};
 }
 
 template <typename T>
-void CurveField<T>::EnhanceRow(const T* samples, const std::uint8_t* valid, const T* noData,
-                               const Place& row, const Columns& columns, Scratch& scratch,
-                               T* results) const {
-  std::size_t begin = 0;
-  for (const std::size_t end : columns.ends) {
-    const Place& column = columns.places[begin];
-    const std::size_t count = end - begin;
-    const bool isOneCell = row.first == row.second && column.first == column.second;
-    for (std::size_t c = 0; c < channels_; ++c) {
-      const T* const from = samples + begin * channels_ + c;
-      for (std::size_t i = 0; i < count; ++i) scratch.levels[i] = from[i * channels_];
-      const BlendRun run{count,
-                         scratch.levels.data(),
-                         columns.weights.data() + begin,
-                         row.weight,
-                         Corners(row, column, c),
-                         powers_.data(),
-                         static_cast<float>(filters::kTopLevel<T>),
-                         scratch.results.data()};
-      if (isOneCell) {
-        Follow(run);
-      } else {
-        Blend(run);
-      }
-      T* const to = results + begin * channels_ + c;
-      for (std::size_t i = 0; i < count; ++i) {
-        const auto result = static_cast<T>(scratch.results[i]);
-        to[i * channels_] = valid == nullptr || valid[begin + i] != 0 ? result : to[i * channels_];
+void CurveField<T>::EnhanceTile(const Block& block, const Axis& rows, const Axis& columns,
+                                const Run& rowRun, const Run& columnRun, std::size_t channel,
+                                Scratch& scratch) const {
+  constexpr bool kTabulates = sizeof(T) == 1;  // each level once for the whole tile
+  constexpr auto kTop = static_cast<float>(filters::kTopLevel<T>);
+  const std::array<Curve, 4> curves = Corners(rowRun, columnRun, channel);
+  const std::size_t width = columnRun.end - columnRun.begin;
+  std::int32_t* const levels = scratch.levels.data();
+  const auto evaluate = [&](std::size_t count) {
+    LookUpPowers(curves, powers_.data(), levels, count, scratch.Corner(0), scratch.pitch);
+    for (std::size_t k = 0; k < curves.size(); ++k) {
+      CurveValues(curves[k], kTop, levels, count, scratch.Corner(k));
+    }
+  };
+  const auto blendRows = [&](float weight, std::size_t count) {
+    BlendRows(scratch.Corner(0), scratch.Corner(1), weight, count, scratch.Left());
+    BlendRows(scratch.Corner(2), scratch.Corner(3), weight, count, scratch.Right());
+  };
+  if constexpr (kTabulates) {
+    std::iota(levels, levels + kByteLevels, 0);
+    evaluate(kByteLevels);
+  }
+  const float* const left = kTabulates ? scratch.LeftOfPixels() : scratch.Left();
+  const float* const right = kTabulates ? scratch.RightOfPixels() : scratch.Right();
+  for (std::size_t y = rowRun.begin; y < rowRun.end; ++y) {
+    const std::size_t first = y * block.width + columnRun.begin;
+    const T* const samples = block.samples + first * channels_ + channel;
+    if constexpr (kTabulates) {
+      blendRows(rows.weights[y], kByteLevels);
+      LookUpPairs(scratch.Left(), scratch.Right(), samples, channels_, width,
+                  scratch.LeftOfPixels(), scratch.RightOfPixels());
+    } else {
+      TakeLevels(samples, channels_, width, levels);
+      evaluate(width);
+      blendRows(rows.weights[y], width);
+    }
+    BlendColumns(left, right, columns.weights.data() + columnRun.begin, width, levels);
+    PutLevels(levels, block.valid == nullptr ? nullptr : block.valid + first, channels_, width,
+              block.results + first * channels_ + channel);
+  }
+}
+
+template <typename T>
+void CurveField<T>::EnhanceRows(const Block& block, const Axis& rows, const Axis& columns,
+                                std::size_t begin, std::size_t end, Scratch& scratch) const {
+  for (const Run& run : rows.runs) {
+    Run part = run;
+    part.begin = std::max(part.begin, begin);
+    part.end = std::min(part.end, end);
+    if (part.begin >= part.end) continue;
+    for (const Run& columnRun : columns.runs) {
+      for (std::size_t c = 0; c < channels_; ++c) {
+        EnhanceTile(block, rows, columns, part, columnRun, c, scratch);
       }
     }
-    begin = end;
   }
-  if (noData == nullptr) return;
-  for (std::size_t x = 0; x < columns.places.size(); ++x) {
-    if (valid == nullptr || valid[x] != 0)
-      MoveOffNoData(noData, channels_, results + x * channels_);
+  if (block.noData == nullptr) return;
+  for (std::size_t i = begin * block.width; i < end * block.width; ++i) {
+    if (block.valid != nullptr && block.valid[i] == 0) continue;
+    MoveOffNoData(block.noData, channels_, block.results + i * channels_);
   }
 }
 
 template <typename T>
 void CurveField<T>::Apply(const gobs::Raster& input, const std::uint8_t* valid, const T* noData,
                           gobs::Raster& output) const {
-  const std::size_t width = input.Width();
-  const auto rows = static_cast<std::ptrdiff_t>(input.Height());
-  const Columns columns = PlaceColumns(input);
-  const std::ptrdiff_t bands = parallel::BandCount(rows);
-  std::vector<Scratch> scratch(static_cast<std::size_t>(bands), Scratch(width));
-  const auto* const samples = static_cast<const T*>(input.Data());
-  auto* const results = static_cast<T*>(output.Data());
+  const Axis columns = PlaceAlong(input.OriginX(), input.Width(), tileWidth_, columns_);
+  const Axis rows = PlaceAlong(input.OriginY(), input.Height(), tileHeight_, rows_);
+  const Block block{static_cast<const T*>(input.Data()), valid, noData,
+                    static_cast<T*>(output.Data()), input.Width()};
+  const auto count = static_cast<std::ptrdiff_t>(input.Height());
+  const std::ptrdiff_t bands = parallel::BandCount(count);
+  std::vector<Scratch> scratch(static_cast<std::size_t>(bands), Scratch(input.Width()));
   parallel::ForEachRowBand(
-      rows, bands, [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
-        for (std::ptrdiff_t y = begin; y < end; ++y) {
-          const std::size_t first = static_cast<std::size_t>(y) * width;
-          const Place row = PlaceOf(std::uint64_t{input.OriginY()} + static_cast<std::uint64_t>(y),
-                                    tileHeight_, rows_);
-          EnhanceRow(samples + first * channels_, valid == nullptr ? nullptr : valid + first,
-                     noData, row, columns, scratch[static_cast<std::size_t>(band)],
-                     results + first * channels_);
-        }
+      count, bands, [&](std::ptrdiff_t band, std::ptrdiff_t begin, std::ptrdiff_t end) {
+        EnhanceRows(block, rows, columns, static_cast<std::size_t>(begin),
+                    static_cast<std::size_t>(end), scratch[static_cast<std::size_t>(band)]);
       });
 }
 

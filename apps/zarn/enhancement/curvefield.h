@@ -20,14 +20,13 @@ enum class CellBlending {
 /// Enhances the pixels of an image by the curves of a grid of cells.
 ///
 /// Blended, a pixel becomes the bilinear mean of what the curves of the four nearest cells make of
-/// it, by the distances of its centre to theirs; beyond the outermost centres the nearest cells
-/// count alone. All is computed in single precision and rounded half up. The place of a pixel is
-/// that in the whole image, so that nothing depends on windows.
+/// it, by the distances of its centre to theirs: first between the cells above and below, then
+/// between those on the left and on the right; beyond the outermost centres the nearest cells count
+/// alone. All is computed in single precision and rounded half up. The place of a pixel is that in
+/// the whole image, so that nothing depends on windows.
 template <typename T>
 class CurveField {
  public:
-  using Curve = processes::filters::PowerCurve;
-
   CurveField(const processes::filters::IGeoLUTMatrix& matrix, CellBlending blending);
 
   /// Enhances a block without margins. Pixels whose byte in `valid` is 0 are left alone; `valid`
@@ -37,20 +36,19 @@ class CurveField {
              gobs::Raster& output) const;
 
  private:
-  /// The cells before and after a pixel along an axis, and the weight of the latter.
-  struct Place {
-    std::uint32_t first;
-    std::uint32_t second;
-    float weight;
-  };
-  struct Columns;
+  using Curve = processes::filters::PowerCurve;
+  struct Block;
+  struct Run;
+  struct Axis;
   struct Scratch;
 
-  Place PlaceOf(std::uint64_t position, std::uint32_t tile, std::uint32_t cells) const;
-  Columns PlaceColumns(const gobs::Raster& block) const;
-  std::array<Curve, 4> Corners(const Place& row, const Place& column, std::size_t channel) const;
-  void EnhanceRow(const T* samples, const std::uint8_t* valid, const T* noData, const Place& row,
-                  const Columns& columns, Scratch& scratch, T* results) const;
+  Axis PlaceAlong(std::uint64_t origin, std::size_t count, std::uint32_t tile,
+                  std::uint32_t cells) const;
+  std::array<Curve, 4> Corners(const Run& rows, const Run& columns, std::size_t channel) const;
+  void EnhanceRows(const Block& block, const Axis& rows, const Axis& columns, std::size_t begin,
+                   std::size_t end, Scratch& scratch) const;
+  void EnhanceTile(const Block& block, const Axis& rows, const Axis& columns, const Run& rowRun,
+                   const Run& columnRun, std::size_t channel, Scratch& scratch) const;
 
   std::uint32_t tileWidth_;
   std::uint32_t tileHeight_;

@@ -124,11 +124,12 @@ Image ReferenceEnhancement(const Image& image, const Enhancing& e) {
           return static_cast<float>(tables[static_cast<std::size_t>(table)]
                                           [static_cast<std::size_t>(image.At(x, y, band))]);
         };
-        const float upper =
-            value(above, left) + (value(above, right) - value(above, left)) * weightX;
-        const float lower =
-            value(below, left) + (value(below, right) - value(below, left)) * weightX;
-        result.At(x, y, band) = std::floor(upper + (lower - upper) * weightY + 0.5F);
+        const auto between = [](float first, float second, float weight) {
+          return first + (second - first) * weight;
+        };
+        const float onLeft = between(value(above, left), value(below, left), weightY);
+        const float onRight = between(value(above, right), value(below, right), weightY);
+        result.At(x, y, band) = std::floor(between(onLeft, onRight, weightX) + 0.5F);
       }
       if (result.AllBands(x, y, e.noData)) {
         result.At(x, y, 0) += result.At(x, y, 0) == std::numeric_limits<T>::max() ? -1 : 1;

@@ -31,7 +31,7 @@ class BlockReader : public datasources::IRasterReader {
   gobs::NativeDataTypeCode DataTypeCode() const override { return gobs::GetDataTypeCode(image_); }
   datasources::AuxiliaryData Auxiliary() const override { return {}; }
   void Read(gobs::Raster& block, std::uint8_t* valid) override {
-    const std::size_t pixel = block.Type().Description().BytesPerSample() * Channels();
+    const std::size_t pixel = block.DescribedSize() / (std::size_t{block.Width()} * block.Height());
     for (std::size_t y = 0; y < block.Height(); ++y) {
       const auto* const row = static_cast<const std::uint8_t*>(image_.Data()) +
                               ((block.OriginY() + y) * Width() + block.OriginX()) * pixel;
