@@ -440,8 +440,12 @@ void FillRows(const Target<T>& target, std::ptrdiff_t sourceWidth, IBufPosTfm& t
 template <typename T>
 std::vector<T> NoDataPixel(const ResampleInfo& info, std::ptrdiff_t channels, bool isComplex) {
   if (!info.hasNoData) return {};
-  std::vector<T> pixel(static_cast<std::size_t>(channels), gobs::RoundToSample<T>(info.noData));
-  for (std::size_t c = 1; isComplex && c < pixel.size(); c += 2) pixel[c] = T{0};
+  std::vector<T> pixel(static_cast<std::size_t>(channels), T{0});
+  const std::size_t step = isComplex ? 2 : 1;
+  for (std::size_t i = 0; i < pixel.size(); i += step) {
+    pixel[i] =
+        gobs::RoundToSample<T>(info.noDataPixel.empty() ? info.noData : info.noDataPixel[i / step]);
+  }
   return pixel;
 }
 
@@ -528,6 +532,10 @@ void Resample(const ResampleBuffer& source, ResampleBuffer& destination, IBufPos
   }
   if (source.Type() != destination.Type() || source.Channels() != destination.Channels()) {
     throw DataException("Resampling buffers differ in data type or number of channels.");
+  }
+  if (!info.noDataPixel.empty() &&
+      info.noDataPixel.size() != static_cast<std::size_t>(source.Channels())) {
+    throw DataException("Resampling needs one no-data value per channel.");
   }
   RequireUsable(source);
   RequireUsable(destination);

@@ -23,7 +23,8 @@ namespace zarn::utils {
 ///
 /// Shared out to threads when the transform allows it; the result does not depend on that. Throws
 /// `DataException`, before anything is written, for buffers that differ in type or channels, have
-/// no data, or a type or a method that cannot be resampled.
+/// no data, or a type or a method that cannot be resampled, and for a no-data pixel of another
+/// number of channels.
 ZARN_HOST_EXPORT void Resample(const ResampleBuffer& source, ResampleBuffer& destination,
                                IBufPosTfm* transform, const ResampleInfo& info);
 
