@@ -25,16 +25,29 @@ void CarryRows(const Plane& above, std::int64_t rows, Plane& plane) {
   if (bytes > 0) std::memcpy(plane.Data(), above.Data() + above.Size() - bytes, bytes);
 }
 
-// The rules for one row of pixels; a NaN or an excluded pixel is one as a whole.
+// A no-data pixel; values for complex samples are their real parts, the others are 0.
+template <typename T>
+std::vector<T> NoDataPixel(const std::vector<double>& values, std::size_t parts) {
+  std::vector<T> pixel(values.size() * parts, T{0});
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    pixel[i * parts] = filters::RoundToSample<T>(values[i]);
+  }
+  return pixel;
+}
+
+// The rules for one row of pixels; a NaN or an excluded pixel is one as a whole. Samples have one
+// part, or two where they are complex.
 template <typename T>
 class ValidityRow {
  public:
-  ValidityRow(std::size_t channels, std::size_t alphas, const NoDataValues& noData)
-      : channels_(channels),
+  ValidityRow(std::size_t channels, std::size_t alphas, std::size_t parts,
+              const NoDataValues& noData)
+      : channels_(channels * parts),
         alphas_(alphas),
+        parts_(parts),
         translate_(noData.translate),
-        input_(filters::ConvertNoData<T>(noData.input)),
-        output_(filters::ConvertNoData<T>(noData.output)) {}
+        input_(NoDataPixel<T>(noData.input, parts)),
+        output_(NoDataPixel<T>(noData.output, parts)) {}
 
   void ClearNaN(const T* pixels, std::uint8_t* valid, std::size_t count) const {
     if constexpr (std::is_floating_point_v<T>) {
@@ -48,7 +61,7 @@ class ValidityRow {
 
   void ClearTransparent(const T* alphas, std::uint8_t* valid, std::size_t count) const {
     for (std::size_t i = 0; i < count * alphas_; ++i) {
-      if (alphas[i] == T{0}) valid[i / alphas_] = 0;
+      if (alphas[i * parts_] == T{0}) valid[i / alphas_] = 0;
     }
   }
 
@@ -81,8 +94,9 @@ class ValidityRow {
  private:
   void Translate(T* pixel) const { std::copy(output_.begin(), output_.end(), pixel); }
 
-  std::size_t channels_;
+  std::size_t channels_;  ///< all parts of them
   std::size_t alphas_;
+  std::size_t parts_;
   bool translate_;
   std::vector<T> input_;
   std::vector<T> output_;
@@ -243,8 +257,9 @@ void BlockReader::MarkValid(const Fresh& fresh, WindowBuffers& buffers) {
   };
   forEachRow([&](std::uint8_t* valid, std::int64_t) { std::fill_n(valid, width, 1); });
 
-  VisitAnySampleType(source_.Type().code, [&]<typename T>(std::type_identity<T>) {
-    const ValidityRow<T> rules(source_.Channels().size(), source_.Alphas().size(), noData_);
+  VisitAnySampleType(source_.Type().code, [&]<typename T>(std::type_identity<T>,
+                                                          std::size_t parts) {
+    const ValidityRow<T> rules(source_.Channels().size(), source_.Alphas().size(), parts, noData_);
     const auto samples = [&](std::int64_t y) {
       return reinterpret_cast<T*>(buffers.samples.At(fresh.column, y));
     };

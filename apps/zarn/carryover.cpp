@@ -8,7 +8,9 @@
 #include <cmath>
 #include <cstdint>
 #include <sstream>
+#include <string>
 
+#include "apps/zarn/gdalruntime.h"
 #include "host/gobs/saturatecast.h"
 
 namespace zarn::app {
@@ -51,7 +53,10 @@ CPLStringList WithoutStatistics(char** items) {
 
 void CopyBand(GDALRasterBand& source, GDALRasterBand& output) {
   if (source.GetDescription()[0] != '\0') output.SetDescription(source.GetDescription());
-  if (GDALColorTable* const palette = source.GetColorTable()) output.SetColorTable(palette);
+  if (source.GetColorTable() != nullptr &&
+      output.SetColorTable(source.GetColorTable()) != CE_None) {
+    Warn("the output cannot hold the palette of band " + std::to_string(source.GetBand()));
+  }
   const GDALColorInterp colour = source.GetColorInterpretation();
   if (colour != GCI_Undefined && colour != output.GetColorInterpretation()) {
     output.SetColorInterpretation(colour);

@@ -104,7 +104,9 @@ void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
     text("--dst-nodata", options.dstNoData, "V[,V...]",
          "No-data value of OUT, given to every invalid pixel, or 'none'; by default that of IN");
   }
-  text(help.maskOption.c_str(), options.mask, "FILE", help.maskHelp);
+  if (!help.maskHelp.empty()) {
+    text(help.maskOption.c_str(), options.mask, "FILE", help.maskHelp);
+  }
   text("--of", options.output.format, "FORMAT",
        "GDAL format of OUT; by default by its extension, else GTiff");
   text("--co", options.output.creation, "KEY=VALUE",

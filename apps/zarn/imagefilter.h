@@ -35,7 +35,7 @@ struct ImageFilterOptions {
 
 /// What differs between commands in the options that they share.
 struct ImageFilterHelp {
-  std::string maskHelp;  ///< what a mask file does here
+  std::string maskHelp;  ///< what a mask file does here; empty: there is none
   std::string maskOption = "--mask";
   bool offersNoData = true;  ///< whether the command knows of no-data values
 };

@@ -47,8 +47,9 @@ void AddColourOptions(CPLStringList& options, const RasterSource& like) {
   };
   const bool rgb =
       colourOf(1) == GCI_RedBand && colourOf(2) == GCI_GreenBand && colourOf(3) == GCI_BlueBand;
+  const bool palette = colourOf(1) == GCI_PaletteIndex && like.Dataset().GetRasterCount() == 1;
   if (options.FetchNameValue("PHOTOMETRIC") == nullptr) {
-    options.SetNameValue("PHOTOMETRIC", rgb ? "RGB" : "MINISBLACK");
+    options.SetNameValue("PHOTOMETRIC", rgb ? "RGB" : palette ? "PALETTE" : "MINISBLACK");
   }
   if (options.FetchNameValue("ALPHA") == nullptr) {
     options.SetNameValue("ALPHA", colourOf(rgb ? 4 : 2) == GCI_AlphaBand ? "YES" : "NO");

@@ -4,12 +4,10 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
-#include <cstring>
 #include <limits>
 #include <optional>
 #include <string>
 
-#include "apps/zarn/anysampletype.h"
 #include "apps/zarn/blockreader.h"
 #include "apps/zarn/blockwriter.h"
 #include "apps/zarn/errors.h"
@@ -20,67 +18,14 @@
 #include "apps/zarn/streamer.h"
 #include "host/core/exception.h"
 #include "host/sys/openmp.h"
-#include "processes/filters/framework/nodata.h"
 
 namespace zarn::app {
 namespace {
-
-namespace filters = processes::filters;
 
 // Larger windows gain nothing; a turned image draws on more of the source the wider they are.
 constexpr std::int64_t kLargestSide = 1024;
 
 std::int64_t Pixels(const Window& window) { return window.width * window.height; }
-
-/// Marks the pixels that have the no-data value.
-class NoDataMarker {
- public:
-  NoDataMarker(const RasterSource& source, const std::vector<double>& noData) {
-    if (noData.empty()) return;
-    VisitAnySampleType(source.Type().code, [&]<typename T>(std::type_identity<T>) {
-      mark_ = [value = filters::ConvertNoData<T>(noData)](const Plane& samples, Plane& valid) {
-        const auto* pixel = reinterpret_cast<const T*>(samples.Data());
-        for (std::size_t i = 0; i < valid.Size(); ++i, pixel += value.size()) {
-          if (filters::PixelNearlyEquals(pixel, value.data(), value.size())) {
-            valid.Data()[i] = std::byte{0};
-          }
-        }
-      };
-    });
-  }
-
-  explicit operator bool() const { return static_cast<bool>(mark_); }
-  void operator()(const Plane& samples, Plane& valid) const { mark_(samples, valid); }
-
- private:
-  std::function<void(const Plane&, Plane&)> mark_;
-};
-
-/// Windows of the source with a mask of the pixels that count.
-class SourceReader {
- public:
-  SourceReader(const RasterSource& source, MaskFile* mask, const NoDataValues& noData)
-      : reader_(source, noData, {.mask = mask}), isNoData_(source, noData.input) {}
-
-  std::size_t BytesPerPixel() const {
-    return 2 * reader_.SampleBytes() + reader_.SideBytes() + (isNoData_ ? 1 : 0);
-  }
-
-  void Read(const Window& window, WindowBuffers& buffers) {
-    reader_.Read(window, nullptr, buffers);
-    if (!isNoData_) return;
-    if (!buffers.valid.Used()) {
-      buffers.valid.Shape(window.width, window.height, 1);
-      std::fill_n(buffers.valid.Data(), buffers.valid.Size(), std::byte{1});
-    }
-    isNoData_(buffers.samples, buffers.valid);
-    buffers.masked = std::memchr(buffers.valid.Data(), 0, buffers.valid.Size()) != nullptr;
-  }
-
- private:
-  BlockReader reader_;
-  NoDataMarker isNoData_;
-};
 
 /// One window of the output on its way.
 struct Slot {
@@ -94,7 +39,7 @@ struct Slot {
 class Regridder {
  public:
   Regridder(const RasterSource& source, const Regridding& plan, const NoDataValues& noData,
-            SourceReader& reader, std::int64_t mostSourcePixels)
+            BlockReader& reader, std::int64_t mostSourcePixels)
       : source_(source),
         noData_(noData.output),
         reader_(reader),
@@ -121,6 +66,9 @@ class Regridder {
     };
     RunPipeline(plan.Count(), kStreamSlots, {read, move, write}, 1);
   }
+
+  /// Whether any window so far had a part in the source.
+  bool DrawsOnSource() const { return drawsOnSource_; }
 
  private:
   void Read(const Window& window, Slot& slot) {
@@ -151,7 +99,8 @@ class Regridder {
   void ReadSource(Slot& slot, const Window& part) {
     const Window needed = slot.mover->SourceOf(part);
     if (Pixels(needed) > 0) {
-      reader_.Read(needed, slot.source);
+      reader_.Read(needed, nullptr, slot.source);
+      drawsOnSource_ = true;
     } else {
       slot.source.window = needed;
       slot.source.masked = false;
@@ -220,9 +169,10 @@ class Regridder {
 
   const RasterSource& source_;
   const std::vector<double>& noData_;
-  SourceReader& reader_;
+  BlockReader& reader_;
   std::int64_t mostSourcePixels_;
   bool writesMask_;
+  bool drawsOnSource_ = false;
   std::array<Slot, kStreamSlots> slots_;
 };
 
@@ -251,7 +201,6 @@ void RunRegridding(const ImageFilterOptions& options,
   const std::optional<WindowSize> forcedWindow = ParseWindow(options.window);
 
   const RasterSource source(options.input);
-  source.RefusePalette();
   RequireKnownType(source);
   const NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
   std::optional<MaskFile> mask;
@@ -264,7 +213,7 @@ void RunRegridding(const ImageFilterOptions& options,
   StagedOutput output(options.output, source, noData.output,
                       regridding.grid ? &*regridding.grid : nullptr,
                       Regridder::MasksUncovered(source, noData));
-  SourceReader reader(source, mask ? &*mask : nullptr, noData);
+  BlockReader reader(source, noData, {.mask = mask ? &*mask : nullptr, .marksNoData = true});
   BlockWriter writer(source, output.Dataset(), output.Name());
   int blockWidth = 1;
   int blockHeight = 1;
@@ -286,12 +235,14 @@ void RunRegridding(const ImageFilterOptions& options,
        .memory = static_cast<std::size_t>(memory),
        .forced = window});
   FitBlockCache(source, plan, 0);
+  // Read with each pixel: what it becomes where nothing is computed, and what belongs to it.
+  const std::size_t sourceBytes = 2 * reader.SampleBytes() + reader.SideBytes();
   // What a block can hold at most bounds it too.
   const double mostSourceBytes =
       std::min<double>(slotBytes * 2 / 3, std::numeric_limits<std::uint32_t>::max());
   Regridder regridder(
       source, regridding, noData, reader,
-      static_cast<std::int64_t>(mostSourceBytes / static_cast<double>(reader.BytesPerPixel())));
+      static_cast<std::int64_t>(mostSourceBytes / static_cast<double>(sourceBytes)));
 
   const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
                                                         : sys::OMPGetMaxThreads());
@@ -300,6 +251,10 @@ void RunRegridding(const ImageFilterOptions& options,
   ProgressSpan publishing(progress, output.CopiesAtTheEnd() ? 0.5 : 0.99, 1);
   regridder.Stream(plan, writer, moving);
   output.Publish(publishing);
+  if (!regridder.DrawsOnSource()) {
+    Warn("no pixel of " + source.Name() + " lies on the grid of " + output.Name() +
+         "; all of it is uncovered");
+  }
 }
 
 }  // namespace zarn::app

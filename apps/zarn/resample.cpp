@@ -13,13 +13,12 @@
 #include <utility>
 #include <vector>
 
-#include "apps/zarn/anysampletype.h"
 #include "apps/zarn/errors.h"
+#include "apps/zarn/nodata.h"
 #include "apps/zarn/positionfield.h"
 #include "apps/zarn/regrid.h"
 #include "apps/zarn/sourcelocator.h"
 #include "host/utils/resample.h"
-#include "processes/filters/framework/nodata.h"
 
 namespace zarn::app {
 namespace {
@@ -28,7 +27,7 @@ using utils::ResampleMethod;
 
 struct ResampleOptions {
   ImageFilterOptions image;
-  ResampleMethod method = ResampleMethod::kNearest;
+  std::string method = "nearest";
   std::string crs;
   std::vector<double> extent;      ///< left, lower, right, upper
   std::vector<double> resolution;  ///< width and height of a pixel
@@ -72,18 +71,6 @@ utils::ResampleBuffer BufferOf(const gobs::Raster& block, const std::uint8_t* ma
           const_cast<unsigned char*>(static_cast<const unsigned char*>(block.Data())),
           const_cast<unsigned char*>(mask),
           false};
-}
-
-void FillUncovered(const std::vector<double>& fill, gobs::Raster& output,
-                   const std::uint8_t* covered) {
-  VisitAnySampleType(gobs::GetDataTypeCode(output), [&]<typename T>(std::type_identity<T>) {
-    const std::vector<T> pixel = processes::filters::ConvertNoData<T>(fill);
-    const std::size_t pixels = std::size_t{output.Width()} * output.Height();
-    auto* const samples = static_cast<T*>(output.Data());
-    for (std::size_t i = 0; i < pixels; ++i) {
-      if (covered[i] == 0) std::copy(pixel.begin(), pixel.end(), samples + i * pixel.size());
-    }
-  });
 }
 
 /// Interpolates at the positions of a field.
@@ -130,19 +117,12 @@ class Interpolation : public PixelMover {
     const std::size_t first = Index(output.OriginX(), output.OriginY());
     StoredPositions positions(x_.data() + first, y_.data() + first, window_.width,
                               {source.OriginX(), source.OriginY(), 0, 0});
-    const bool oneValue = std::adjacent_find(fill.begin(), fill.end(), Differ) == fill.end();
-    utils::ResampleInfo info;
-    info.method = method_;
-    info.hasNoData = !fill.empty() && oneValue;
-    info.noData = info.hasNoData ? fill.front() : 0.0;
     utils::ResampleBuffer destination = BufferOf(output, covered);
-    utils::Resample(BufferOf(source, mask), destination, &positions, info);
-    if (!oneValue) FillUncovered(fill, output, covered);
+    utils::Resample(BufferOf(source, mask), destination, &positions,
+                    {.method = method_, .hasNoData = !fill.empty(), .noDataPixel = fill});
   }
 
  private:
-  static bool Differ(double a, double b) { return a != b && !(std::isnan(a) && std::isnan(b)); }
-
   std::size_t Index(std::int64_t column, std::int64_t row) const {
     return static_cast<std::size_t>((row - window_.y) * window_.width + column - window_.x);
   }
@@ -222,19 +202,27 @@ OGRSpatialReference ParseCrs(const std::string& text) {
   return crs;
 }
 
+ResampleMethod MethodOf(const std::string& name) {
+  if (name == "bilinear") return ResampleMethod::kBilinear;
+  return name == "cubic" ? ResampleMethod::kCubic : ResampleMethod::kNearest;
+}
+
 Regridding Fit(const ResampleOptions& options, const RasterSource& source) {
+  const ResampleMethod method = MethodOf(options.method);
+  if (method != ResampleMethod::kNearest) source.RefusePalette();
   OutputGrid grid;
   if (!options.like.empty()) grid = GridOf(options.like);
   if (!options.crs.empty()) grid.crs = ParseCrs(options.crs);
   const auto locator = std::make_shared<SourceLocator>(
       source, grid.crs.IsEmpty() ? nullptr : &grid.crs, options.rpcDem);
   if (options.like.empty()) grid = Adjusted(locator->SuggestGrid(), options);
+  // A grid to follow that names no coordinate system is taken to be in that of the source.
+  grid.crs = locator->Crs();
   locator->SetGrid(grid);
   const auto field = std::make_shared<PositionField>(
       [locator](std::vector<double>& x, std::vector<double>& y) { locator->Locate(x, y); },
       options.threshold);
-  return {grid,
-          [=, &source] { return std::make_unique<Interpolation>(field, source, options.method); },
+  return {grid, [=, &source] { return std::make_unique<Interpolation>(field, source, method); },
           2 * sizeof(double)};
 }
 
@@ -250,15 +238,11 @@ void AddResampleCommand(CLI::App& app) {
   CLI::App& command = *app.add_subcommand(
       "resample", "Bring an image onto another grid or into another coordinate system");
   const auto options = std::make_shared<ResampleOptions>();
-  const std::vector<std::pair<std::string, ResampleMethod>> methods{
-      {"nearest", ResampleMethod::kNearest},
-      {"bilinear", ResampleMethod::kBilinear},
-      {"cubic", ResampleMethod::kCubic}};
   command
-      .add_option("-r,--resampling", options->method,
-                  "nearest (the default), bilinear or cubic (Catmull-Rom)")
+      .add_option("-r,--resampling", options->method, "nearest, bilinear or cubic (Catmull-Rom)")
       ->type_name("METHOD")
-      ->transform(CLI::CheckedTransformer(methods));
+      ->check(CLI::IsMember({"nearest", "bilinear", "cubic"}).description(""))
+      ->capture_default_str();
   CLI::Option* const crs =
       command
           .add_option("--t-srs", options->crs,
@@ -286,7 +270,13 @@ void AddResampleCommand(CLI::App& app) {
       .add_option("--error-threshold", options->threshold,
                   "Error that positions may have, in pixels of IN; 0 computes each exactly")
       ->type_name("PIXELS")
-      ->check(CLI::NonNegativeNumber)
+      ->check(CLI::Validator(
+          [](const std::string& text) {
+            const double pixels = ParseNumber("--error-threshold", text);
+            const bool inRange = pixels >= 0 && std::isfinite(pixels);
+            return inRange ? std::string() : "'" + text + "' is not a finite number of at least 0";
+          },
+          ""))
       ->capture_default_str();
   AddImageFilterOptions(
       command, options->image,
@@ -296,7 +286,9 @@ void AddResampleCommand(CLI::App& app) {
       "IN may have a geotransform, control points, geolocation arrays or an RPC model. Pixels that "
       "are no-data, NaN, transparent (alpha 0) or masked take no part; what less than half of its "
       "weight covers becomes the no-data value of OUT, or transparent, or is marked in a mask band "
-      "where there is neither.\n\n"
+      "where there is neither. Images with a palette take nearest only.\n\n"
+      "The kernels are as wide as pixels of IN, also where OUT is coarser: for OUT to show means "
+      "instead of single pixels, average IN first (zarn average).\n\n"
       "Example:\n  zarn resample -r cubic --t-srs EPSG:32633 scene.tif utm.tif");
 }
 

@@ -42,7 +42,7 @@ class WholePixels : public PixelMover {
     return {left, top, right - left, bottom - top};
   }
 
-  void Move(const gobs::Raster& source, const std::uint8_t*, const std::vector<double>& fill,
+  void Move(const gobs::Raster& source, const std::uint8_t* mask, const std::vector<double>& fill,
             gobs::Raster& output, std::uint8_t* covered) override {
     filter_->SetNoDataValues(nullptr, &fill);
     const auto result = filter_->Process(source, output, 0, 0, nullptr);
@@ -51,8 +51,10 @@ class WholePixels : public PixelMover {
     const std::int64_t top = std::int64_t{source.OriginY()} - rows_ - output.OriginY();
     for (std::int64_t row = 0; row < output.Height(); ++row) {
       const bool inside = row >= top && row < top + source.Height();
+      const std::int64_t first = (row - top) * source.Width() - left;
       for (std::int64_t column = 0; column < output.Width(); ++column) {
-        *covered++ = inside && column >= left && column < left + source.Width() ? 1 : 0;
+        const bool exists = inside && column >= left && column < left + source.Width();
+        *covered++ = exists && (mask == nullptr || mask[first + column] != 0) ? 1 : 0;
       }
     }
   }
@@ -85,9 +87,7 @@ void AddShiftCommand(CLI::App& app) {
                   "Pixel (x, y) of OUT is pixel (x, y + N) of IN: it moves N rows up")
       ->type_name("N")
       ->capture_default_str();
-  AddImageFilterOptions(
-      command, options->image,
-      {.maskHelp = "Raster of the size of IN; pixels where it is 0 are copied all the same"});
+  AddImageFilterOptions(command, options->image, {});
   command.callback([options] {
     RunRegridding(options->image,
                   [&](const RasterSource& source) { return Fit(*options, source); });

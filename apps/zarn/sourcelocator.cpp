@@ -36,6 +36,23 @@ OGRSpatialReference CrsOf(GDALDataset& source) {
   return crs;
 }
 
+// GDAL would take places for pixels, or coordinates of one system for those of another.
+void RequirePlace(const RasterSource& source, bool needsCrs) {
+  GDALDataset& dataset = source.Dataset();
+  double transform[6];
+  if (dataset.GetGeoTransform(transform) != CE_None && dataset.GetGCPCount() == 0 &&
+      dataset.GetMetadata("RPC") == nullptr && dataset.GetMetadata("GEOLOCATION") == nullptr) {
+    throw RunError("cannot resample " + source.Name() +
+                   ": it does not say where it lies; give it an extent (gdal_edit.py -a_ullr) or "
+                   "control points (gdal_translate -gcp)");
+  }
+  if (needsCrs && CrsOf(dataset).IsEmpty()) {
+    throw RunError("cannot resample " + source.Name() +
+                   ": it names no coordinate system to come from; give it one with gdal_edit.py "
+                   "-a_srs");
+  }
+}
+
 std::string WktOf(const OGRSpatialReference& crs) {
   char* text = nullptr;
   const char* const options[] = {"FORMAT=WKT2_2018", nullptr};
@@ -54,6 +71,7 @@ void SourceLocator::Destroyer::operator()(void* transformer) const {
 SourceLocator::SourceLocator(const RasterSource& source, const OGRSpatialReference* crs,
                              const std::string& rpcDem)
     : source_(source), crs_(crs == nullptr ? CrsOf(source.Dataset()) : *crs) {
+  RequirePlace(source, crs != nullptr);
   crs_.SetAxisMappingStrategy(OAMS_TRADITIONAL_GIS_ORDER);
   CPLStringList options;
   if (crs != nullptr) options.SetNameValue("DST_SRS", WktOf(crs_).c_str());

@@ -18,12 +18,14 @@ class SourceLocator {
   /// `crs` is the coordinate system of the output; null: that of the source.
   /// `rpcDem` is a raster of heights for the RPC model, or empty. Throws `UsageError` for
   /// heights that the source does not ask for, `RunError` for a source that does not say where it
-  /// lies.
+  /// lies, or not in which coordinate system although another one is asked for.
   SourceLocator(const RasterSource& source, const OGRSpatialReference* crs,
                 const std::string& rpcDem);
 
   /// The grid that covers the source, with about as many pixels along its diagonal.
   OutputGrid SuggestGrid() const;
+  /// The coordinate system of the output; empty when the source has none.
+  const OGRSpatialReference& Crs() const { return crs_; }
   /// Chooses the grid that `Locate` refers to.
   void SetGrid(const OutputGrid& grid);
   /// Turns positions in the grid, counted from the corner of its first pixel, into positions in the

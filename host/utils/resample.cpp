@@ -17,6 +17,7 @@
 #include "host/gobs/saturatecast.h"
 #include "host/sys/parallel.h"
 #include "host/sys/vectorised.h"
+#include "host/utils/realof.h"
 #if ZARN_SIMD
 #include "host/utils/resample_simd.h"
 #endif
@@ -27,38 +28,44 @@ namespace {
 constexpr std::size_t kMostTaps = 4;
 
 /// The pixels along one axis that a position draws on, and their weights.
+template <typename Real>
 struct Taps {
   std::ptrdiff_t first;
   std::size_t count;
   bool onCentre;  ///< the position is the centre of a pixel
-  std::array<double, kMostTaps> weights;
+  std::array<Real, kMostTaps> weights;
 };
 
-Taps BilinearTaps(double position) {
+template <typename Real>
+Taps<Real> BilinearTaps(double position) {
   const double t = position - 0.5;
   const double left = std::floor(t);
-  const double f = t - left;
-  return {static_cast<std::ptrdiff_t>(left), 2, f == 0.0, {1.0 - f, f}};
+  const auto f = static_cast<Real>(t - left);
+  return {static_cast<std::ptrdiff_t>(left), 2, t == left, {Real(1.0) - f, f}};
 }
 
-Taps CubicTaps(double position) {
+template <typename Real>
+Taps<Real> CubicTaps(double position) {
   const double t = position - 0.5;
   const double left = std::floor(t);
-  const double f = t - left;
+  const auto f = static_cast<Real>(t - left);
+  constexpr auto kHalf = Real(0.5);
+  constexpr auto kThreeHalves = Real(1.5);
   return {static_cast<std::ptrdiff_t>(left) - 1,
           4,
-          f == 0.0,
-          {((1.0 - 0.5 * f) * f - 0.5) * f, (1.5 * f - 2.5) * f * f + 1.0,
-           ((2.0 - 1.5 * f) * f + 0.5) * f, (0.5 * f - 0.5) * f * f}};
+          t == left,
+          {((Real(1.0) - kHalf * f) * f - kHalf) * f,
+           (kThreeHalves * f - Real(2.5)) * f * f + Real(1.0),
+           ((Real(2.0) - kThreeHalves * f) * f + kHalf) * f, (kHalf * f - kHalf) * f * f}};
 }
 
 /// A computed value as a sample.
 template <typename T>
-T ToSample(double value) {
+T ToSample(RealOf<T> value) {
   if constexpr (std::is_floating_point_v<T>) {
     return static_cast<T>(value);
   } else {
-    return gobs::SaturateCast<T>(std::nearbyint(value));
+    return gobs::SaturateCast<T>(static_cast<double>(std::nearbyint(value)));
   }
 }
 
@@ -98,24 +105,25 @@ struct Source {
 };
 
 /// The weights of the pixels around a position, 0 for those that take no part.
+template <typename Real>
 class Weights {
  public:
   template <typename T>
-  Weights(const Source<T>& source, const Taps& columns, const Taps& rows)
+  Weights(const Source<T>& source, const Taps<Real>& columns, const Taps<Real>& rows)
       : columns_(columns), rows_(rows) {
-    double existing = 0.0;
+    Real existing = 0;
     for (std::size_t j = 0; j < rows.count; ++j) {
-      double existingInRow = 0.0;
-      double validInRow = 0.0;
+      Real existingInRow = 0;
+      Real validInRow = 0;
       for (std::size_t i = 0; i < columns.count; ++i) {
         const std::ptrdiff_t column = columns.first + static_cast<std::ptrdiff_t>(i);
         const std::ptrdiff_t row = rows.first + static_cast<std::ptrdiff_t>(j);
-        double weight = columns.weights[i];
+        Real weight = columns.weights[i];
         const bool exists = source.Exists(column, row);
         if (exists) existingInRow += weight;
         if (!exists || !source.IsValid(column, row)) {
-          complete_ = complete_ && (weight == 0.0 || rows.weights[j] == 0.0);
-          weight = 0.0;
+          complete_ = complete_ && (weight == 0 || rows.weights[j] == 0);
+          weight = 0;
         }
         validInRow += weight;
         inRow_[j][i] = weight;
@@ -123,23 +131,23 @@ class Weights {
       existing += rows.weights[j] * existingInRow;
       valid_ += rows.weights[j] * validInRow;
     }
-    covers_ = valid_ > 0.0 && valid_ >= 0.5 * existing;
+    covers_ = valid_ > 0 && valid_ >= Real(0.5) * existing;
   }
 
   bool Covers() const { return covers_; }
 
   /// Sample `c` of the pixel.
   template <typename T>
-  double Apply(const Source<T>& source, std::ptrdiff_t c) const {
-    double sum = 0.0;
+  Real Apply(const Source<T>& source, std::ptrdiff_t c) const {
+    Real sum = 0;
     for (std::size_t j = 0; j < rows_.count; ++j) {
-      if (rows_.weights[j] == 0.0) continue;
-      double rowSum = 0.0;
+      if (rows_.weights[j] == 0) continue;
+      Real rowSum = 0;
       for (std::size_t i = 0; i < columns_.count; ++i) {
-        if (inRow_[j][i] == 0.0) continue;
+        if (inRow_[j][i] == 0) continue;
         const T* const pixel = source.Pixel(columns_.first + static_cast<std::ptrdiff_t>(i),
                                             rows_.first + static_cast<std::ptrdiff_t>(j));
-        rowSum += inRow_[j][i] * static_cast<double>(pixel[c]);
+        rowSum += inRow_[j][i] * static_cast<Real>(pixel[c]);
       }
       sum += rows_.weights[j] * rowSum;
     }
@@ -147,10 +155,10 @@ class Weights {
   }
 
  private:
-  const Taps& columns_;
-  const Taps& rows_;
-  std::array<std::array<double, kMostTaps>, kMostTaps> inRow_{};
-  double valid_ = 0.0;
+  const Taps<Real>& columns_;
+  const Taps<Real>& rows_;
+  std::array<std::array<Real, kMostTaps>, kMostTaps> inRow_{};
+  Real valid_ = 0;
   bool complete_ = true;  ///< nothing that has a weight is missing
   bool covers_ = false;
 };
@@ -159,14 +167,16 @@ class Weights {
 template <typename T>
 class Interpolator {
  public:
-  Interpolator(const Source<T>& source, Taps (*tapsAt)(double), const std::vector<T>& noData)
-      : source_(source), tapsAt_(tapsAt), noData_(noData) {}
+  using Real = RealOf<T>;
+
+  Interpolator(const Source<T>& source, bool cubic, const std::vector<T>& noData)
+      : source_(source), tapsAt_(cubic ? CubicTaps<Real> : BilinearTaps<Real>), noData_(noData) {}
 
   /// Writes the pixel at a position, unless it is uncovered.
   bool operator()(double x, double y, T* pixel) const {
     if (!source_.Contains(x, y)) return false;
-    const Taps columns = tapsAt_(x);
-    const Taps rows = tapsAt_(y);
+    const Taps<Real> columns = tapsAt_(x);
+    const Taps<Real> rows = tapsAt_(y);
     if (columns.onCentre && rows.onCentre) {
       const auto column = static_cast<std::ptrdiff_t>(x);
       const auto row = static_cast<std::ptrdiff_t>(y);
@@ -174,7 +184,7 @@ class Interpolator {
       std::copy_n(source_.Pixel(column, row), source_.channels, pixel);
       return true;
     }
-    const Weights weights(source_, columns, rows);
+    const Weights<Real> weights(source_, columns, rows);
     if (!weights.Covers()) return false;
     for (std::ptrdiff_t c = 0; c < source_.channels; ++c) {
       pixel[c] = ToSample<T>(weights.Apply(source_, c));
@@ -187,7 +197,7 @@ class Interpolator {
 
  private:
   Source<T> source_;
-  Taps (*tapsAt_)(double);
+  Taps<Real> (*tapsAt_)(double);
   const std::vector<T>& noData_;
 };
 
@@ -278,7 +288,7 @@ class InterpolatedRows {
       : source_(source),
         target_(target),
         cubic_(cubic),
-        interpolate_(source, cubic ? CubicTaps : BilinearTaps, target.noData) {
+        interpolate_(source, cubic, target.noData) {
 #if ZARN_SIMD
     if (!kHasKernel || !HasResampleVectors()) return;
     scratch_ = std::make_unique<RunScratch>();
@@ -440,8 +450,12 @@ void FillRows(const Target<T>& target, std::ptrdiff_t sourceWidth, IBufPosTfm& t
 template <typename T>
 std::vector<T> NoDataPixel(const ResampleInfo& info, std::ptrdiff_t channels, bool isComplex) {
   if (!info.hasNoData) return {};
-  std::vector<T> pixel(static_cast<std::size_t>(channels), gobs::RoundToSample<T>(info.noData));
-  for (std::size_t c = 1; isComplex && c < pixel.size(); c += 2) pixel[c] = T{0};
+  std::vector<T> pixel(static_cast<std::size_t>(channels), T{0});
+  const std::size_t step = isComplex ? 2 : 1;
+  for (std::size_t i = 0; i < pixel.size(); i += step) {
+    pixel[i] =
+        gobs::RoundToSample<T>(info.noDataPixel.empty() ? info.noData : info.noDataPixel[i / step]);
+  }
   return pixel;
 }
 
@@ -528,6 +542,10 @@ void Resample(const ResampleBuffer& source, ResampleBuffer& destination, IBufPos
   }
   if (source.Type() != destination.Type() || source.Channels() != destination.Channels()) {
     throw DataException("Resampling buffers differ in data type or number of channels.");
+  }
+  if (!info.noDataPixel.empty() &&
+      info.noDataPixel.size() != static_cast<std::size_t>(source.Channels())) {
+    throw DataException("Resampling needs one no-data value per channel.");
   }
   RequireUsable(source);
   RequireUsable(destination);

@@ -18,12 +18,14 @@ namespace zarn::utils {
 /// Masked pixels take no part and the weights of the others are made to sum to one. Pixels beyond
 /// the edge do not exist: they take no part either, but nothing is missing without them. A position
 /// on the centre of a valid pixel gives that pixel unchanged. Everything else is computed in
-/// double; integers are rounded to the nearest, ties to even, and clamped to their type. A computed
-/// pixel that would equal the no-data value in all its samples is moved off it by one step.
+/// double, bytes in float; integers are rounded to the nearest, ties to even, and clamped to their
+/// type. A computed pixel that would equal the no-data value in all its samples is moved off it by
+/// one step.
 ///
 /// Shared out to threads when the transform allows it; the result does not depend on that. Throws
 /// `DataException`, before anything is written, for buffers that differ in type or channels, have
-/// no data, or a type or a method that cannot be resampled.
+/// no data, or a type or a method that cannot be resampled, and for a no-data pixel of another
+/// number of channels.
 ZARN_HOST_EXPORT void Resample(const ResampleBuffer& source, ResampleBuffer& destination,
                                IBufPosTfm* transform, const ResampleInfo& info);
 

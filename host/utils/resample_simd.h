@@ -34,6 +34,8 @@ struct RunScratch {
 
   alignas(64) std::array<double, kResampleRun> fractionX;
   alignas(64) std::array<double, kResampleRun> fractionY;
+  alignas(64) std::array<std::int32_t, kResampleRun> column;  ///< of the first neighbour, or -1
+  alignas(64) std::array<std::int32_t, kResampleRun> row;     ///< of the first neighbour, or -1
   alignas(64) std::array<std::uint64_t, kResampleRun> index;  ///< of the first neighbour
   alignas(64) std::array<std::uint64_t, kResampleRun * kWords> words;
   alignas(64) std::array<std::uint64_t, kResampleRun * 4> planes;

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <vector>
 
 namespace zarn::utils {
 
@@ -15,8 +16,9 @@ enum class ResampleMethod : std::int32_t {
 
 struct ResampleInfo {
   ResampleMethod method = ResampleMethod::kNearest;
-  bool hasNoData = false;  ///< whether uncovered pixels are written at all
-  double noData = 0.0;     ///< for all channels; with complex samples the real part
+  bool hasNoData = false;                ///< whether uncovered pixels are written at all
+  double noData = 0.0;                   ///< for all channels; with complex samples the real part
+  std::vector<double> noDataPixel = {};  ///< unless empty, one value per channel instead
 };
 
 }  // namespace zarn::utils

@@ -32,19 +32,28 @@ struct Picture {
   }
 };
 
+/// Bytes are computed in float.
+template <typename T>
+using SumOf = std::conditional_t<sizeof(T) == 1, float, double>;
+
+template <typename Sum>
 struct AxisWeights {
   std::ptrdiff_t first;
-  std::vector<double> weights;
+  std::vector<Sum> weights;
 };
 
-inline AxisWeights WeightsAt(double position, bool cubic) {
+template <typename Sum>
+AxisWeights<Sum> WeightsAt(double position, bool cubic) {
   const double left = std::floor(position - 0.5);
-  const double f = position - 0.5 - left;
+  const auto f = static_cast<Sum>(position - 0.5 - left);
   const auto first = static_cast<std::ptrdiff_t>(left);
-  if (!cubic) return {first, {1.0 - f, f}};
+  const Sum one = 1;
+  const Sum half = one / 2;
+  const Sum threeHalves = one + half;
+  if (!cubic) return {first, {one - f, f}};
   return {first - 1,
-          {((1.0 - 0.5 * f) * f - 0.5) * f, (1.5 * f - 2.5) * f * f + 1.0,
-           ((2.0 - 1.5 * f) * f + 0.5) * f, (0.5 * f - 0.5) * f * f}};
+          {((one - half * f) * f - half) * f, (threeHalves * f - (one + threeHalves)) * f * f + one,
+           ((one + one - threeHalves * f) * f + half) * f, (half * f - half) * f * f}};
 }
 
 template <typename T>
@@ -82,21 +91,22 @@ std::optional<std::vector<T>> ReferencePixel(const Picture<T>& image, utils::Res
     return pixel;
   }
   const bool cubic = method == utils::ResampleMethod::kCubic;
-  const AxisWeights columns = WeightsAt(x, cubic);
-  const AxisWeights rows = WeightsAt(y, cubic);
-  double existing = 0;
-  double valid = 0;
+  using Sum = SumOf<T>;
+  const AxisWeights<Sum> columns = WeightsAt<Sum>(x, cubic);
+  const AxisWeights<Sum> rows = WeightsAt<Sum>(y, cubic);
+  Sum existing = 0;
+  Sum valid = 0;
   bool complete = true;
-  std::vector<double> sums(channels, 0.0);
+  std::vector<Sum> sums(channels, Sum{0});
   for (std::size_t j = 0; j < rows.weights.size(); ++j) {
-    double existingInRow = 0;
-    double validInRow = 0;
-    std::vector<double> rowSums(channels, 0.0);
+    Sum existingInRow = 0;
+    Sum validInRow = 0;
+    std::vector<Sum> rowSums(channels, Sum{0});
     for (std::size_t i = 0; i < columns.weights.size(); ++i) {
       const std::ptrdiff_t column = columns.first + static_cast<std::ptrdiff_t>(i);
       const std::ptrdiff_t row = rows.first + static_cast<std::ptrdiff_t>(j);
       const bool exists = column >= 0 && row >= 0 && column < image.width && row < image.height;
-      const double weight = columns.weights[i];
+      const Sum weight = columns.weights[i];
       if (exists) existingInRow += weight;
       if (weight == 0 || rows.weights[j] == 0) continue;
       if (!exists || !image.Valid(column, row)) {
@@ -106,7 +116,7 @@ std::optional<std::vector<T>> ReferencePixel(const Picture<T>& image, utils::Res
       validInRow += weight;
       for (std::size_t c = 0; c < channels; ++c) {
         rowSums[c] +=
-            weight * static_cast<double>(image.At(column, row, static_cast<std::ptrdiff_t>(c)));
+            weight * static_cast<Sum>(image.At(column, row, static_cast<std::ptrdiff_t>(c)));
       }
     }
     existing += rows.weights[j] * existingInRow;
@@ -114,7 +124,7 @@ std::optional<std::vector<T>> ReferencePixel(const Picture<T>& image, utils::Res
     if (rows.weights[j] == 0) continue;
     for (std::size_t c = 0; c < channels; ++c) sums[c] += rows.weights[j] * rowSums[c];
   }
-  if (!(valid > 0) || valid < 0.5 * existing) return {};
+  if (!(valid > 0) || valid < existing / 2) return {};
   bool isAvoided = avoided.has_value();
   for (std::size_t c = 0; c < channels; ++c) {
     pixel[c] = Rounded<T>(complete ? sums[c] : sums[c] / valid);

@@ -36,17 +36,36 @@ Decorate Georeference(const Transform& transform, int epsg,
   };
 }
 
+// A palette beside the place.
+Decorate Colours() {
+  return [place = Georeference(kNorthUp, 32633)](GDALDataset& dataset) {
+    place(dataset);
+    GDALColorTable table;
+    for (int i = 0; i < 256; ++i) {
+      const GDALColorEntry colour{static_cast<short>(i), static_cast<short>(i == 3 ? 250 : 9),
+                                  static_cast<short>(i == 3 ? 40 : 9), 255};
+      table.SetColorEntry(i, &colour);
+    }
+    dataset.GetRasterBand(1)->SetColorTable(&table);
+  };
+}
+
 class Resampling : public testing::Test {
  protected:
-  Image Run(Arguments arguments) {
+  Image Run(Arguments arguments, const std::string& warning = {}) {
     arguments.insert(arguments.end(), {"--overwrite", folder_ / "in.tif", folder_ / "out.tif"});
     const Outcome outcome = RunProgram(arguments);
     EXPECT_EQ(outcome.status, 0) << outcome.err;
+    if (warning.empty()) {
+      EXPECT_EQ(outcome.err, "");
+    } else {
+      ExpectOneLine(outcome, 0, warning);
+    }
     return outcome.status == 0 ? Read(folder_ / "out.tif") : Image(0, 0, 0, GDT_Byte);
   }
-  Image Resample(Arguments options) {
+  Image Resample(Arguments options, const std::string& warning = {}) {
     options.insert(options.begin(), "resample");
-    return Run(options);
+    return Run(options, warning);
   }
   Transform GeoTransform() {
     Transform transform{};
@@ -272,7 +291,7 @@ TEST_F(Resampling, LocatesByControlPointsAndByRpc) {
 
   // Lines run with latitude and samples with longitude, a hundredth of a degree for each.
   const std::string zeros = " 0 0 0 0 0 0 0 0 0 0 0 0 0 0 0 0 0";
-  Write(image, folder_ / "in.tif", {}, [&](GDALDataset& dataset) {
+  const auto writeWithRpc = [&](const char* height) {
     const std::vector<std::pair<const char*, std::string>> items{
         {"LINE_OFF", "19.5"},
         {"SAMP_OFF", "29.5"},
@@ -286,13 +305,100 @@ TEST_F(Resampling, LocatesByControlPointsAndByRpc) {
         {"HEIGHT_SCALE", "100"},
         {"LINE_NUM_COEFF", "0 0 -1" + zeros},
         {"LINE_DEN_COEFF", "1 0 0" + zeros},
-        {"SAMP_NUM_COEFF", "0 1 0" + zeros},
+        {"SAMP_NUM_COEFF", "0 1 0 " + std::string(height) + zeros.substr(2)},
         {"SAMP_DEN_COEFF", "1 0 0" + zeros}};
-    for (const auto& [key, value] : items) dataset.SetMetadataItem(key, value.c_str(), "RPC");
-  });
-  const Image rpc = Resample({"--te", "9.7", "39.8", "10.3", "40.2", "--tr", "0.01", "0.01"});
-  EXPECT_EQ(Difference(image, rpc), "");
+    Write(image, folder_ / "in.tif", {}, [&](GDALDataset& dataset) {
+      for (const auto& [key, value] : items) dataset.SetMetadataItem(key, value.c_str(), "RPC");
+    });
+  };
+  writeWithRpc("0");
+  const Arguments degrees{"--te", "9.7", "39.8", "10.3", "40.2", "--tr", "0.01", "0.01"};
+  EXPECT_EQ(Difference(image, Resample(degrees)), "");
   EXPECT_EQ(OpenImage(folder_ / "out.tif")->GetMetadata("RPC"), nullptr);
+
+  // 30 samples for every 100 m of height: the image moves by 3 where the heights are 10.
+  writeWithRpc("1");
+  Image heights(100, 80, 1, GDT_Float32);
+  for (int y = 40; y < 80; ++y) {
+    for (int x = 0; x < 100; ++x) heights.At(x, y, 0) = 10;
+  }
+  Write(heights, folder_ / "heights.tif", {}, Georeference({9.5, 0.01, 0, 40.4, 0, -0.01}, 4326));
+  Arguments raised = degrees;
+  raised.insert(raised.end(), {"--rpc-dem", folder_ / "heights.tif", "--dst-nodata", "255"});
+  const Image result = Resample(raised);
+  for (int y = 0; y < 40; ++y) {
+    for (int x = 0; x < 60; ++x) {
+      const int from = y < 20 ? x : x + 3;
+      ASSERT_EQ(result.At(x, y, 0), from < 60 ? image.At(from, y, 0) : 255) << x << " " << y;
+    }
+  }
+}
+
+TEST_F(Resampling, GivesTheOutputsNoDataToAllThatHasNoValue) {
+  const Image image = NoiseImage(40, 30, 2, GDT_Int16, -5, 8);
+  Write(image, folder_ / "in.tif", {}, Georeference(kNorthUp, 32633, -5));
+  for (const Arguments& command :
+       std::vector<Arguments>{{"shift", "--dx", "2"},
+                              {"resample", "--te", "500060", "5099100", "501260", "5100000"}}) {
+    for (const char* const values : {"77", "77,-78", "none"}) {
+      Arguments arguments = command;
+      arguments.insert(arguments.end(), {"--dst-nodata", values});
+      const Image result = Run(arguments);
+      const std::vector<std::uint8_t> mask = MaskOf("out.tif");
+      for (int y = 0; y < 30; ++y) {
+        for (int x = 0; x < 40; ++x) {
+          SCOPED_TRACE(command[0] + " " + values + " at " + std::to_string(x) + " " +
+                       std::to_string(y));
+          const bool covered = x < 38 && !image.AllBands(x + 2, y, -5);
+          const auto pixel = static_cast<std::size_t>(y * 40 + x);
+          if (covered) {
+            ASSERT_EQ(result.At(x, y, 0), image.At(x + 2, y, 0));
+            ASSERT_EQ(result.At(x, y, 1), image.At(x + 2, y, 1));
+          } else if (std::string(values) != "none") {
+            ASSERT_EQ(result.At(x, y, 0), 77);
+            ASSERT_EQ(result.At(x, y, 1), std::string(values) == "77" ? 77 : -78);
+          }
+          if (std::string(values) == "none") {
+            ASSERT_EQ(mask[pixel], covered ? 255 : 0);
+          }
+        }
+      }
+    }
+  }
+}
+
+TEST_F(Resampling, ComplexImagesKnowNoDataAsRealOnesDo) {
+  const Arguments variants[] = {
+      {"shift", "--dx", "-3", "--dst-nodata", "77,-78"},
+      {"resample", "-r", "cubic", "--te", "499900", "5099110", "501200", "5100010"},
+      {"resample", "-r", "bilinear", "--te", "499900", "5099110", "501200", "5100010",
+       "--dst-nodata", "77,-78"}};
+  Image image = NoiseImage(40, 30, 2, GDT_Int16, -5, 8);
+  for (const Arguments& arguments : variants) {
+    image.type = GDT_Int16;
+    Write(image, folder_ / "in.tif", {}, Georeference(kNorthUp, 32633, -5));
+    Image expected = Run(arguments);
+    image.type = expected.type = GDT_CInt16;
+    Write(image, folder_ / "in.tif", {}, Georeference(kNorthUp, 32633, -5));
+    EXPECT_EQ(Difference(expected, Run(arguments)), "") << arguments[0];
+  }
+}
+
+TEST_F(Resampling, ComputedPixelsNeverBecomeNoData) {
+  // Half a pixel further every pixel is the mean of its neighbours, the no-data pixel of the
+  // output.
+  Image image(6, 1, 2, GDT_Byte);
+  for (int x = 0; x < 6; ++x) {
+    image.At(x, 0, 0) = x % 2 == 0 ? 99 : 101;
+    image.At(x, 0, 1) = x % 2 == 0 ? 48 : 52;
+  }
+  Write(image, folder_ / "in.tif", {}, Georeference(kNorthUp, 32633));
+  const Image result = Resample({"-r", "bilinear", "--dst-nodata", "100,50", "--te", "500015",
+                                 "5099970", "500165", "5100000"});
+  for (int x = 0; x < 5; ++x) {
+    EXPECT_EQ(result.At(x, 0, 0), 101);
+    EXPECT_EQ(result.At(x, 0, 1), 51);
+  }
 }
 
 TEST_F(Resampling, RefusesWhatMakesNoGrid) {
@@ -301,12 +407,19 @@ TEST_F(Resampling, RefusesWhatMakesNoGrid) {
   Write(NoiseImage(20, 10, 1, GDT_Byte, {}, 8), folder_ / "bare.tif");
   const std::string in = folder_ / "in.tif";
   const std::string bare = folder_ / "bare.tif";
+  const std::string nowhere = folder_ / "nowhere.tif";
+  const std::string palette = folder_ / "palette.tif";
+  Write(NoiseImage(20, 10, 1, GDT_Byte, {}, 8), nowhere, {}, [](GDALDataset& dataset) {
+    Transform transform = kNorthUp;
+    dataset.SetGeoTransform(transform.data());
+  });
+  Write(Image(20, 10, 1, GDT_Byte), palette, {}, Colours());
   const struct {
     Arguments arguments;
     int status;
     const char* part;
   } kCases[] = {
-      {{"-r", "lanczos", in}, 2, "lanczos"},
+      {{"-r", "lanczos", in}, 2, "lanczos not in {nearest,bilinear,cubic}"},
       {{"--t-srs", "EPSG:0", in}, 2, "EPSG:0"},
       {{"--te", "1", "2", "1", "3", in}, 2, "--te"},
       {{"--te", "1", "2", "3", "nan", in}, 2, "--te"},
@@ -316,8 +429,12 @@ TEST_F(Resampling, RefusesWhatMakesNoGrid) {
       {{"--like", in, "--tr", "1", "1", in}, 2, "--like"},
       {{"--like", folder_ / "none.tif", in}, 1, "none.tif"},
       {{"--rpc-dem", in, in}, 2, "--rpc-dem"},
-      {{"--error-threshold", "-1", in}, 2, "--error-threshold"},
-      {{bare}, 1, "bare.tif"},
+      {{"--error-threshold", "-1", in}, 2, "'-1' is not a finite number of at least 0"},
+      {{"--error-threshold", "nan", in}, 2, "'nan' is not a finite number of at least 0"},
+      {{bare}, 1, "bare.tif: it does not say where it lies"},
+      {{"--t-srs", "EPSG:4326", nowhere}, 1, "nowhere.tif: it names no coordinate system"},
+      {{"--like", in, nowhere}, 1, "nowhere.tif: it names no coordinate system"},
+      {{"-r", "cubic", palette}, 1, "palette.tif, band 1, has a palette"},
   };
   for (const auto& c : kCases) {
     Arguments arguments = c.arguments;
@@ -325,7 +442,36 @@ TEST_F(Resampling, RefusesWhatMakesNoGrid) {
     arguments.push_back(folder_ / "out.tif");
     ExpectOneLine(RunProgram(arguments), c.status, c.part);
   }
-  EXPECT_EQ(folder_.Names(), (std::set<std::string>{"in.tif", "bare.tif"}));
+  ExpectOneLine(RunProgram({"shift", "--mask", in, in, folder_ / "out.tif"}), 2, "--mask");
+  EXPECT_EQ(folder_.Names(),
+            (std::set<std::string>{"in.tif", "bare.tif", "nowhere.tif", "palette.tif"}));
+}
+
+TEST_F(Resampling, CopiedPixelsKeepTheirPalette) {
+  const Image image = NoiseImage(20, 10, 1, GDT_Byte, {}, 8);
+  Write(image, folder_ / "in.tif", {}, Colours());
+  const struct {
+    Arguments arguments;
+    int shift;
+  } kCases[] = {{{"shift", "--dx", "1"}, 1},
+                {{"shift", "--of", "PNG"}, 0},
+                {{"resample", "--te", "500030", "5099700", "500600", "5100000"}, 1}};
+  for (const auto& c : kCases) {
+    const Image result = Run(c.arguments);
+    for (int x = 0; x < 19; ++x) EXPECT_EQ(result.At(x, 3, 0), image.At(x + c.shift, 3, 0));
+    const OpenDataset output = OpenImage(folder_ / "out.tif");
+    const GDALColorTable* const table = output->GetRasterBand(1)->GetColorTable();
+    ASSERT_NE(table, nullptr) << c.arguments[1];
+    EXPECT_EQ(table->GetColorEntry(3)->c2, 250);
+    EXPECT_EQ(table->GetColorEntry(4)->c3, 9);
+  }
+}
+
+TEST_F(Resampling, WarnsWhenNothingIsCovered) {
+  Write(NoiseImage(20, 10, 1, GDT_Byte, {}, 8), folder_ / "in.tif", {},
+        Georeference(kNorthUp, 32633));
+  Resample({"--te", "1000", "2000", "1300", "2300"}, "no pixel of");
+  Run({"shift", "--dx", "20"}, "no pixel of");
 }
 
 TEST_F(Resampling, ShiftMovesWholePixelsOnTheGrid) {
@@ -342,16 +488,43 @@ TEST_F(Resampling, ShiftMovesWholePixelsOnTheGrid) {
       }
     }
     for (const char* const window : {"16x7", "90x60"}) {
-      EXPECT_EQ(Difference(expected, Run({"shift", "--dx", std::to_string(dx), "--dy",
-                                          std::to_string(dy), "--window", window})),
-                "");
+      const Arguments shift{"shift",    "--dx", std::to_string(dx), "--dy", std::to_string(dy),
+                            "--window", window};
+      EXPECT_EQ(Difference(expected, Run(shift, dx == -100 ? "no pixel of" : "")), "");
       EXPECT_EQ(GeoTransform(), kNorthUp);
     }
   }
+}
+
+TEST_F(Resampling, ShiftMovesTheMaskBand) {
+  const Image image = NoiseImage(90, 60, 2, GDT_Int16, {}, 8);
+  std::vector<std::uint8_t> mask(90 * 60, 255);
+  for (std::size_t i = 0; i < mask.size(); i += 7) mask[i] = 0;
   Write(image, folder_ / "in.tif");
   Run({"shift", "--dx", "1"});
   EXPECT_EQ(MaskOf("out.tif")[88], 255);
   EXPECT_EQ(MaskOf("out.tif")[89], 0);
+
+  Write(image, folder_ / "in.tif", {}, [&](GDALDataset& dataset) {
+    dataset.CreateMaskBand(GMF_PER_DATASET);
+    ASSERT_EQ(dataset.GetRasterBand(1)->GetMaskBand()->RasterIO(GF_Write, 0, 0, 90, 60, mask.data(),
+                                                                90, 60, GDT_Byte, 0, 0, nullptr),
+              CE_None);
+  });
+  const Image result = Run({"shift", "--dx", "-4", "--dy", "2", "--window", "16x7"});
+  const std::vector<std::uint8_t> moved = MaskOf("out.tif");
+  for (int y = 0; y < 60; ++y) {
+    for (int x = 0; x < 90; ++x) {
+      const bool exists = x >= 4 && y < 58;
+      const int from = (y + 2) * 90 + x - 4;
+      ASSERT_EQ(moved[static_cast<std::size_t>(y * 90 + x)],
+                exists ? mask[static_cast<std::size_t>(from)] : 0)
+          << x << " " << y;
+      if (exists) {
+        ASSERT_EQ(result.At(x, y, 1), image.At(x - 4, y + 2, 1));
+      }
+    }
+  }
 }
 
 }  // namespace

@@ -96,17 +96,25 @@ void Mask(RandomNumbers& random, Picture<T>& image) {
   }
 }
 
-// Smooth runs, and positions on the edge, on centres, between columns, outside and nowhere.
+// Smooth runs, broken by more or fewer positions on the edge, on centres, between columns, outside
+// and nowhere.
 std::vector<Position> Positions(RandomNumbers& random, int count, double width, double height) {
   std::vector<Position> positions;
+  const double step = 0.4 + 0.8 * random.Fraction();
   const double slope = random.Fraction() * 0.2;
+  const int wild = random.Pick<std::uint32_t>({0, 1, 12});
   for (int i = 0; i < count; ++i) {
-    Position at{i * 0.7 + slope, height / 2 + slope * i + random.Fraction()};
-    if (random.Percent(15)) at = {(random.Fraction() + 1) / 2 * width, random.Fraction() * height};
-    if (random.Percent(10)) at.x = std::floor(at.x) + 0.5;
-    if (random.Percent(10)) at.y = std::floor(at.y) + 0.5;
-    if (random.Percent(10)) at.x = random.Pick<double>({-1e-9, 0, 0.25, width - 0.5, width, 1e300});
-    if (random.Percent(10)) at.y = random.Pick<double>({-0.5, 0, 1.5, height - 1e-9, kNaN, -1e300});
+    Position at{i * step + slope, height / 2 + slope * i + 0.3 * random.Fraction()};
+    if (random.Percent(wild))
+      at = {(random.Fraction() + 1) / 2 * width, random.Fraction() * height};
+    if (random.Percent(wild)) at.x = std::floor(at.x) + 0.5;
+    if (random.Percent(wild)) at.y = std::floor(at.y) + 0.5;
+    if (random.Percent(wild)) {
+      at.x = random.Pick<double>({-1e-9, 0, 0.25, width - 0.5, width, 1e300});
+    }
+    if (random.Percent(wild)) {
+      at.y = random.Pick<double>({-0.5, 0, 1.5, height - 1e-9, kNaN, -1e300});
+    }
     positions.push_back(at);
   }
   return positions;
