@@ -10,6 +10,7 @@
 #include <string>
 
 #include "apps/zarn/average.h"
+#include "apps/zarn/blend.h"
 #include "apps/zarn/dodge.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/estimate/fitdodging.h"
@@ -52,6 +53,7 @@ void AddCommands(CLI::App& app) {
       "'zarn COMMAND --help' shows the options of a command.\n\n"
       "Example:\n  zarn average --size 5 scene.tif smooth.tif");
   zarn::app::AddAverageCommand(app);
+  zarn::app::AddBlendCommand(app);
   zarn::app::AddFitDodgingCommand(app);
   zarn::app::AddFitGainOffsetCommand(app);
   zarn::app::AddFitHotSpotCommand(app);
