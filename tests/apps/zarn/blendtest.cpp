@@ -232,6 +232,23 @@ TEST_F(Blending, FollowsTheFormulaWithHoleNoDataAndSourceMap) {
   }
 }
 
+TEST_F(Blending, TheTileCutsTheFeatherOff) {
+  WriteFeatures({{OnMap(Star())}}, folder_ / "cutline.gpkg");
+  WriteFeatures({{OnMap({Rectangle(100, 60, 190, 150)})}}, folder_ / "tile.geojson", "GeoJSON");
+  WriteScene(GDT_Byte);
+  Image expected = testsupport::Blended(source_, mosaic_, Star(), 9, NoData(kSourceNoData),
+                                        NoData(kMosaicNoData))
+                       .mosaic;
+  for (int y = 0; y < kRows; ++y) {
+    for (int x = 0; x < kColumns; ++x) {
+      if (x >= 100 && x < 190 && y >= 60 && y < 150) continue;
+      for (int band = 0; band < 3; ++band) expected.At(x, y, band) = mosaic_.At(x, y, band);
+    }
+  }
+  EXPECT_EQ(Difference(expected, Blended({"--feather", "9", "--tile", folder_ / "tile.geojson"})),
+            "");
+}
+
 TEST_F(Blending, DoesNotDependOnWindowsThreadsOrPlace) {
   WriteFeatures({{OnMap(Star())}}, folder_ / "cutline.gpkg");
   WriteScene(GDT_Byte);
