@@ -83,7 +83,10 @@ SampleType SampleTypeOf(GDALRasterBand& band) {
   return {CodeOf(type), type};
 }
 
-RasterSource::RasterSource(const std::string& name) : name_(name), dataset_(OpenRaster(name)) {
+RasterSource::RasterSource(const std::string& name) : RasterSource(name, OpenRaster(name)) {}
+
+RasterSource::RasterSource(const std::string& name, DatasetPtr dataset)
+    : name_(name), dataset_(std::move(dataset)) {
   if (dataset_->GetRasterCount() == 0) {
     throw RunError(name + " has no raster bands; name one of its subdatasets (see gdalinfo)");
   }

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "host/gobs/datatypes.h"
@@ -39,6 +40,8 @@ class RasterSource {
  public:
   /// Throws `RunError` for what cannot be filtered: no bands, or bands of different types.
   explicit RasterSource(const std::string& name);
+  /// The same for a dataset that is open; `name` is what messages call it.
+  RasterSource(const std::string& name, DatasetPtr dataset);
 
   const std::string& Name() const { return name_; }
   GDALDataset& Dataset() const { return *dataset_; }
@@ -58,6 +61,9 @@ class RasterSource {
   int BlockHeight() const { return blockHeight_; }
   /// Throws `RunError` when a band has a palette, whose numbers cannot be computed with.
   void RefusePalette() const;
+  /// Gives the dataset away, so that it can be closed with a look at what comes of it; only the
+  /// name and the sample type may be asked for afterwards.
+  DatasetPtr TakeDataset() { return std::move(dataset_); }
 
  private:
   void SortBands();

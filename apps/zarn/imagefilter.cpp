@@ -26,12 +26,14 @@ namespace filters = processes::filters;
                  reason);
 }
 
-// The filter itself knows its sample types; one pixel asks it before anything is written.
+}  // namespace
+
 void RequireSampleType(const RasterSource& source, const WindowFilter& probe) {
   using enum gobs::NativeDataTypeCode;
   if (source.Type().code == kUnknown || source.Type().code == kNone) {
     FailFiltering(source, "Unknown sample type.");
   }
+  // One pixel asks.
   const gobs::RasterInfo pixel(1, 1, 1, source.Type().code);
   gobs::Raster output(pixel);
   filters::FilterResult result;
@@ -44,8 +46,6 @@ void RequireSampleType(const RasterSource& source, const WindowFilter& probe) {
   }
   if (!result.Ok()) FailFiltering(source, result.message);
 }
-
-}  // namespace
 
 std::optional<WindowSize> ParseWindow(const std::string& text) {
   if (text.empty()) return std::nullopt;
@@ -82,18 +82,32 @@ CLI::Validator WholeNumber(std::int64_t least, std::optional<std::int64_t> most)
       "");
 }
 
-void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
-                           const ImageFilterHelp& help) {
-  const auto text = [&](const char* name, auto& value, const char* type,
-                        const std::string& description) {
-    return command.add_option(name, value, description)->type_name(type);
-  };
+void AddWorkOptions(CLI::App& command, WorkOptions& options, const std::string& image) {
   const auto number = [&](const char* name, auto& value, const char* type, std::int64_t least,
                           std::optional<std::int64_t> most, const char* description) {
     command.add_option(name, value, description)
         ->type_name(type)
         ->check(WholeNumber(least, most))
         ->capture_default_str();
+  };
+  number("--threads", options.threads, "N", 0, 4096,
+         "Threads for filtering and for compression each; 0 means all");
+  number("--memory", options.memory, "MIB", 1, std::int64_t{1} << 30,
+         "Memory for the windows in work");
+  command
+      .add_option("--window", options.window,
+                  "Size of the pieces in which " + image +
+                      " is worked through, instead of choosing it; the result does not depend on "
+                      "it")
+      ->type_name("COLSxROWS");
+  command.add_flag("-q,--quiet", options.quiet, "No progress and no warnings");
+}
+
+void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
+                           const ImageFilterHelp& help) {
+  const auto text = [&](const char* name, auto& value, const char* type,
+                        const std::string& description) {
+    return command.add_option(name, value, description)->type_name(type);
   };
   text("IN", options.input, "", "Raster to filter: anything that GDAL reads")->required();
   text("OUT", options.output.target, "", "Raster to write")->required();
@@ -114,14 +128,7 @@ void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
        "(DEFLATE)")
       ->allow_extra_args(false);
   command.add_flag("--overwrite", options.output.overwrite, "Replace OUT if it exists");
-  number("--threads", options.threads, "N", 0, 4096,
-         "Threads for filtering and for compression each; 0 means all");
-  number("--memory", options.memory, "MIB", 1, std::int64_t{1} << 30,
-         "Memory for the windows in work");
-  text("--window", options.window, "COLSxROWS",
-       "Size of the pieces in which IN is worked through, instead of choosing it; the result does "
-       "not depend on it");
-  command.add_flag("-q,--quiet", options.quiet, "No progress and no warnings");
+  AddWorkOptions(command, options, "IN");
 }
 
 WindowFilter OnWindows(std::unique_ptr<filters::IFilter> filter, const NoDataValues& noData) {

@@ -20,17 +20,21 @@
 
 namespace zarn::app {
 
+/// How the commands work that take a raster through memory in windows.
+struct WorkOptions {
+  std::string window;
+  std::int64_t memory = 256;  ///< MiB
+  int threads = 0;            ///< 0: all
+  bool quiet = false;
+};
+
 /// What the commands share that filter one image: `zarn <command> [options] IN OUT`.
-struct ImageFilterOptions {
+struct ImageFilterOptions : WorkOptions {
   std::string input;
   OutputOptions output;
   std::string srcNoData;
   std::string dstNoData;
   std::string mask;
-  std::string window;
-  std::int64_t memory = 256;  ///< MiB
-  int threads = 0;            ///< 0: all
-  bool quiet = false;
 };
 
 /// What differs between commands in the options that they share.
@@ -39,6 +43,9 @@ struct ImageFilterHelp {
   std::string maskOption = "--mask";
   bool offersNoData = true;  ///< whether the command knows of no-data values
 };
+
+/// Declares the options on a subcommand; `image` is what their help calls the raster.
+void AddWorkOptions(CLI::App& command, WorkOptions& options, const std::string& image);
 
 /// Declares IN, OUT and the options on a subcommand.
 void AddImageFilterOptions(CLI::App& command, ImageFilterOptions& options,
@@ -54,6 +61,10 @@ using WindowFilter = std::function<processes::filters::FilterResult(const Window
 /// A filter of the library that works on one block alone, with the no-data values given.
 WindowFilter OnWindows(std::unique_ptr<processes::filters::IFilter> filter,
                        const NoDataValues& noData);
+
+/// Throws `RunError` unless `probe`, which needs no halo and no labels, handles the sample type of
+/// `source`: the filters themselves know best.
+void RequireSampleType(const RasterSource& source, const WindowFilter& probe);
 
 /// The size that `--window` asks for, if any; throws `UsageError`.
 std::optional<WindowSize> ParseWindow(const std::string& text);

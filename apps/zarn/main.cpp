@@ -10,6 +10,7 @@
 #include <string>
 
 #include "apps/zarn/average.h"
+#include "apps/zarn/blend.h"
 #include "apps/zarn/dodge.h"
 #include "apps/zarn/enhance.h"
 #include "apps/zarn/errors.h"
@@ -54,6 +55,7 @@ void AddCommands(CLI::App& app) {
       "Example:\n  zarn average --size 5 scene.tif smooth.tif");
   zarn::app::AddAverageCommand(app);
   zarn::app::AddEnhanceCommand(app);
+  zarn::app::AddBlendCommand(app);
   zarn::app::AddFitDodgingCommand(app);
   zarn::app::AddFitGainOffsetCommand(app);
   zarn::app::AddFitHotSpotCommand(app);

@@ -87,14 +87,18 @@ bool CanHold(gobs::NativeDataTypeCode code, double value) {
   return value == std::trunc(value) && value >= least && value <= most;
 }
 
+std::vector<double> NoDataOf(const RasterSource& source, const std::string& option,
+                             const std::string& text) {
+  const auto given = ParseNoData(option, text);
+  return given ? Holdable(source, option, ForAllChannels(source, option, *given))
+               : Holdable(source, source.Name() + ": no-data value", source.NoData());
+}
+
 NoDataValues ResolveNoData(const RasterSource& source, const std::string& srcOption,
                            const std::string& dstOption) {
   NoDataValues result;
-  const auto src = ParseNoData("--src-nodata", srcOption);
+  result.input = NoDataOf(source, "--src-nodata", srcOption);
   const auto dst = ParseNoData("--dst-nodata", dstOption);
-  result.input =
-      src ? Holdable(source, "--src-nodata", ForAllChannels(source, "--src-nodata", *src))
-          : Holdable(source, source.Name() + ": no-data value", source.NoData());
   result.output = result.input;
   if (dst) {
     result.output = Holdable(source, "--dst-nodata", ForAllChannels(source, "--dst-nodata", *dst));

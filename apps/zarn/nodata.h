@@ -30,6 +30,11 @@ struct NoDataValues {
   bool translate = false;
 };
 
+/// The no-data values of one raster: those of `option`, where it was given as `text`, else the
+/// file's own. Refuses and warns as `ResolveNoData` does.
+std::vector<double> NoDataOf(const RasterSource& source, const std::string& option,
+                             const std::string& text);
+
 /// Settles the values: the options, where given, else the file's own, and for the output those of
 /// the input. A value that the samples cannot hold means none and is warned about; a list of a
 /// wrong length is a `UsageError`.

@@ -131,16 +131,21 @@ void OutputFormat::RequireSamples(const SampleType& type) const {
   }
 }
 
-CPLStringList OutputFormat::OptionsFor(const RasterSource& like) const {
+CPLStringList OutputFormat::OptionsFor(const SampleType& type) const {
   CPLStringList options(options_);
   if (EQUAL(driver_->GetDescription(), "GTiff")) {
-    AddCompression(options, like.Type());
-    AddColourOptions(options, like);
+    AddCompression(options, type);
   } else if (EQUAL(driver_->GetDescription(), "COG") &&
              options.FetchNameValue("BIGTIFF") == nullptr) {
     options.SetNameValue("BIGTIFF", "IF_SAFER");
   }
-  if (WritesBlocks()) AddSignedByte(options, like.Type());
+  if (WritesBlocks()) AddSignedByte(options, type);
+  return options;
+}
+
+CPLStringList OutputFormat::OptionsFor(const RasterSource& like) const {
+  CPLStringList options = OptionsFor(like.Type());
+  if (EQUAL(driver_->GetDescription(), "GTiff")) AddColourOptions(options, like);
   return options;
 }
 

@@ -29,6 +29,8 @@ class OutputFormat {
   /// The options for an output with the bands of `like`: the caller's, and for GeoTIFF tiles and
   /// compression where he did not choose himself.
   CPLStringList OptionsFor(const RasterSource& like) const;
+  /// The same for an output of bands without colours.
+  CPLStringList OptionsFor(const SampleType& type) const;
   /// Options for a quickly written GeoTIFF that a copying format then reads.
   static CPLStringList ScratchOptionsFor(const RasterSource& like);
 

@@ -17,26 +17,6 @@ namespace zarn::app {
 namespace fs = std::filesystem;
 namespace {
 
-// `files` are what an output at `target` is going to replace. Every raster that is open is being
-// read: the input, a mask, whatever else a command works with.
-void RefuseReplacingInputs(const fs::path& target, const std::vector<fs::path>& files) {
-  int count = 0;
-  GDALDataset* const* const inputs = GDALDataset::GetOpenDatasets(&count);
-  for (int i = 0; i < count; ++i) {
-    const CPLStringList parts(inputs[i]->GetFileList());
-    for (int k = 0; k < parts.size(); ++k) {
-      for (const fs::path& file : files) {
-        std::error_code error;
-        if (!fs::equivalent(parts[k], file, error)) continue;
-        throw UsageError("the output " + target.string() +
-                         (file == target ? " is" : " would replace " + file.string() + ",") +
-                         " a file of the input " + inputs[i]->GetDescription() +
-                         "; name another output");
-      }
-    }
-  }
-}
-
 std::string TargetBesideInputs(const std::string& target) {
   std::vector<fs::path> files = SideFiles(target);
   files.emplace_back(target);
@@ -60,6 +40,24 @@ int SpaceErrorAt(const std::string& name, int last) {
 }
 
 }  // namespace
+
+void RefuseReplacingInputs(const fs::path& target, const std::vector<fs::path>& files) {
+  int count = 0;
+  GDALDataset* const* const inputs = GDALDataset::GetOpenDatasets(&count);
+  for (int i = 0; i < count; ++i) {
+    const CPLStringList parts(inputs[i]->GetFileList());
+    for (int k = 0; k < parts.size(); ++k) {
+      for (const fs::path& file : files) {
+        std::error_code error;
+        if (!fs::equivalent(parts[k], file, error)) continue;
+        throw UsageError("the output " + target.string() +
+                         (file == target ? " is" : " would replace " + file.string() + ",") +
+                         " a file of the input " + inputs[i]->GetDescription() +
+                         "; name another output");
+      }
+    }
+  }
+}
 
 void FailWriting(const std::string& name, const std::string& reason) {
   const int last = errno;

@@ -54,6 +54,12 @@ class StagedOutput {
   DatasetPtr dataset_;
 };
 
+/// Throws `UsageError` when one of `files`, which an output at `target` is going to replace, is a
+/// file of a raster that is open. Every such raster is being read: the input, a mask, whatever else
+/// a command works with.
+void RefuseReplacingInputs(const std::filesystem::path& target,
+                           const std::vector<std::filesystem::path>& files);
+
 /// Closes a dataset that was written; throws as `FailWriting` does when only that shows that
 /// something was not.
 void CloseChecked(DatasetPtr dataset, const std::string& name);

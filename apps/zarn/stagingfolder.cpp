@@ -149,7 +149,10 @@ void StagingFolder::Publish() {
 
 void StagingFolder::ReplaceOldFiles() {
   std::error_code error;
-  for (const fs::path& file : SideFiles(target_)) fs::remove(file, error);
+  for (const fs::path& file : SideFiles(target_)) {
+    // One that is replaced is never missing.
+    if (!fs::exists(folder_ / file.filename(), error)) fs::remove(file, error);
+  }
   for (const fs::path& name : StagedNames()) {
     const fs::path file = target_.parent_path() / name;
     if (rename((folder_ / name).c_str(), file.c_str()) != 0) FailMoving(file, errno);

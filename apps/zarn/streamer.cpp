@@ -11,22 +11,12 @@
 namespace zarn::app {
 namespace {
 
-gobs::RasterInfo Describe(const Window& window, std::size_t channels, gobs::NativeDataTypeCode type,
-                          std::int64_t halo) {
-  const auto margin = static_cast<std::uint32_t>(halo);
-  return gobs::RasterInfo(static_cast<std::uint32_t>(window.width),
-                          static_cast<std::uint32_t>(window.height),
-                          static_cast<std::uint32_t>(channels), type,
-                          gobs::BlockFrame{margin, margin, static_cast<std::uint32_t>(window.x),
-                                           static_cast<std::uint32_t>(window.y)});
-}
-
 void FilterWindow(const RasterSource& source, const BlockFunction& filter, WindowBuffers& buffers) {
   const auto channels = source.Channels().size();
-  const gobs::Raster input =
-      gobs::Raster::WrapConst(Describe(buffers.window, channels, source.Type().code, buffers.halo),
-                              buffers.samples.Data(), buffers.samples.Size());
-  gobs::Raster output(Describe(buffers.window, channels, source.Type().code, 0),
+  const gobs::Raster input = gobs::Raster::WrapConst(
+      DescribeBlock(buffers.window, channels, source.Type().code, buffers.halo),
+      buffers.samples.Data(), buffers.samples.Size());
+  gobs::Raster output(DescribeBlock(buffers.window, channels, source.Type().code, 0),
                       buffers.output.Data(), buffers.output.Size());
   const auto bytes = [](const Plane& plane, bool wanted) {
     return wanted ? reinterpret_cast<const std::uint8_t*>(plane.Data()) : nullptr;
@@ -40,13 +30,23 @@ void FilterWindow(const RasterSource& source, const BlockFunction& filter, Windo
     return;
   }
   const gobs::Raster labels =
-      gobs::Raster::WrapConst(Describe(buffers.window, 1, buffers.labelType, buffers.halo),
+      gobs::Raster::WrapConst(DescribeBlock(buffers.window, 1, buffers.labelType, buffers.halo),
                               buffers.labels.Data(), buffers.labels.Size());
   blocks.labels = &labels;
   filter(blocks);
 }
 
 }  // namespace
+
+gobs::RasterInfo DescribeBlock(const Window& window, std::size_t channels,
+                               gobs::NativeDataTypeCode type, std::int64_t halo) {
+  const auto margin = static_cast<std::uint32_t>(halo);
+  return gobs::RasterInfo(static_cast<std::uint32_t>(window.width),
+                          static_cast<std::uint32_t>(window.height),
+                          static_cast<std::uint32_t>(channels), type,
+                          gobs::BlockFrame{margin, margin, static_cast<std::uint32_t>(window.x),
+                                           static_cast<std::uint32_t>(window.y)});
+}
 
 void StreamWindows(const RasterSource& source, const WindowPlan& plan, BlockReader& reader,
                    const BlockFunction& filter, BlockWriter& writer, nspio::Counter& progress) {

@@ -16,6 +16,10 @@ namespace zarn::app {
 /// Windows that are in memory at a time: one being read, one filtered and one written.
 inline constexpr std::size_t kStreamSlots = 3;
 
+/// The shape of a block that holds `window`, at its place in the image, with a margin of `halo`.
+gobs::RasterInfo DescribeBlock(const Window& window, std::size_t channels,
+                               gobs::NativeDataTypeCode type, std::int64_t halo);
+
 /// One window as a filter sees it.
 struct WindowBlocks {
   const gobs::Raster& input;               ///< with the margins that were planned for

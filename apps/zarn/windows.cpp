@@ -33,7 +33,8 @@ class Chooser {
       return *request_.forced;
     }
     // Preferably at most half of a block is margin; else as few rows as the output allows.
-    const std::int64_t wanted = std::max(rowUnit_, RoundUp(2 * request_.halo, rowUnit_));
+    const std::int64_t wanted =
+        std::max(rowUnit_, RoundUp(std::max(2 * request_.halo, request_.fewestRows), rowUnit_));
     for (const std::int64_t rows : {std::min(wanted, FullHeight()), rowUnit_}) {
       for (std::int64_t columns = 1;; ++columns) {
         const WindowSize size{ColumnWidth(columns), rows};

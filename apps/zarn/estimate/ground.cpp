@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <sstream>
 #include <string>
 
 #include "apps/zarn/errors.h"
@@ -23,6 +24,12 @@ std::string NameOf(const OGRSpatialReference& system) {
 
 }  // namespace
 
+bool SameSystem(const OGRSpatialReference& a, const OGRSpatialReference& b) {
+  const char* const kOptions[] = {"IGNORE_DATA_AXIS_TO_SRS_AXIS_MAPPING=YES",
+                                  "CRITERION=EQUIVALENT_EXCEPT_AXIS_ORDER_GEOGCRS", nullptr};
+  return a.IsSame(&b, kOptions) != FALSE;
+}
+
 void RequireSameSystem(const RasterSource& first, const RasterSource& other) {
   const OGRSpatialReference* const a = first.Dataset().GetSpatialRef();
   const OGRSpatialReference* const b = other.Dataset().GetSpatialRef();
@@ -32,15 +39,11 @@ void RequireSameSystem(const RasterSource& first, const RasterSource& other) {
                    (a == nullptr ? other : first).Name() +
                    " does; add it with gdal_edit.py -a_srs");
   }
-  const char* const kOptions[] = {"IGNORE_DATA_AXIS_TO_SRS_AXIS_MAPPING=YES",
-                                  "CRITERION=EQUIVALENT_EXCEPT_AXIS_ORDER_GEOGCRS", nullptr};
-  if (a->IsSame(b, kOptions) == FALSE) {
+  if (!SameSystem(*a, *b)) {
     throw RunError(other.Name() + " lies in another coordinate system (" + NameOf(*b) + ") than " +
                    first.Name() + " (" + NameOf(*a) + "); reproject it first with gdalwarp -t_srs");
   }
 }
-
-namespace {
 
 void RequireComparable(const RasterSource& first, const RasterSource& other) {
   if (other.Type() != first.Type()) {
@@ -55,8 +58,6 @@ void RequireComparable(const RasterSource& first, const RasterSource& other) {
   }
   RequireSameSystem(first, other);
 }
-
-}  // namespace
 
 Extent Intersection(const Extent& a, const Extent& b) {
   return {std::max(a.left, b.left), std::max(a.bottom, b.bottom), std::min(a.right, b.right),
@@ -111,25 +112,73 @@ Window Ground::PixelsIn(const Extent& extent) const {
           inside(std::ceil(bottom), size_.height) - y};
 }
 
-std::vector<Ground> ComparableGrounds(const std::vector<RasterSource>& sources) {
+namespace {
+
+std::vector<Ground> GroundsOf(const std::vector<const RasterSource*>& sources) {
   std::vector<Ground> grounds;
   grounds.reserve(sources.size());
-  const RasterSource& first = sources.front();
-  for (const RasterSource& source : sources) {
-    RequireComparable(first, source);
-    grounds.emplace_back(source);
+  const RasterSource& first = *sources.front();
+  for (const RasterSource* const source : sources) {
+    RequireSameSystem(first, *source);
+    grounds.emplace_back(*source);
     if (grounds.back().Georeferenced() != grounds.front().Georeferenced()) {
-      throw RunError((grounds.back().Georeferenced() ? first : source).Name() +
+      throw RunError((grounds.back().Georeferenced() ? first : *source).Name() +
                      " is not georeferenced; it cannot be laid over the others");
     }
-    const bool sameSize = source.Width() == first.Width() && source.Height() == first.Height();
+    const bool sameSize = source->Width() == first.Width() && source->Height() == first.Height();
     if (!grounds.back().Georeferenced() && !sameSize) {
-      throw RunError(source.Name() + " and " + first.Name() +
+      throw RunError(source->Name() + " and " + first.Name() +
                      " are not georeferenced and differ in size; georeference them with "
                      "gdal_edit.py -a_ullr");
     }
   }
   return grounds;
+}
+
+std::string TransformText(const RasterSource& source) {
+  std::array<double, 6> transform{};
+  source.Dataset().GetGeoTransform(transform.data());
+  std::ostringstream text;
+  text.precision(15);
+  for (const double& value : transform) text << (&value == transform.data() ? "(" : ", ") << value;
+  return text.str() + ")";
+}
+
+}  // namespace
+
+GridPlace PlaceOnGrid(const RasterSource& first, const RasterSource& other) {
+  const std::vector<Ground> grounds = GroundsOf({&first, &other});
+  const Ground& ground = grounds.front();
+  const Ground& otherGround = grounds.back();
+  const auto columnOf = [&](double x, double y) {
+    return ground.Column(otherGround.X(x, y), otherGround.Y(x, y));
+  };
+  const auto rowOf = [&](double x, double y) {
+    return ground.Row(otherGround.X(x, y), otherGround.Y(x, y));
+  };
+  const double column = std::floor(columnOf(0, 0) + 0.5);
+  const double row = std::floor(rowOf(0, 0) + 0.5);
+  for (const double x : {0.0, static_cast<double>(other.Width())}) {
+    for (const double y : {0.0, static_cast<double>(other.Height())}) {
+      constexpr double kTolerance = 0.1;
+      const double off =
+          std::max(std::abs(columnOf(x, y) - x - column), std::abs(rowOf(x, y) - y - row));
+      if (off <= kTolerance && std::abs(column) < 0x1p40 && std::abs(row) < 0x1p40) continue;
+      throw RunError(other.Name() + " does not lie on the pixels of " + first.Name() +
+                     ": its geotransform is " + TransformText(other) + ", the other one " +
+                     TransformText(first) + "; bring it there with zarn resample --like");
+    }
+  }
+  return {static_cast<std::int64_t>(column), static_cast<std::int64_t>(row)};
+}
+
+std::vector<Ground> ComparableGrounds(const std::vector<RasterSource>& sources) {
+  std::vector<const RasterSource*> pointers;
+  for (const RasterSource& source : sources) {
+    RequireComparable(sources.front(), source);
+    pointers.push_back(&source);
+  }
+  return GroundsOf(pointers);
 }
 
 }  // namespace zarn::app

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <ogr_spatialref.h>
+
 #include <array>
 #include <cstdint>
 #include <vector>
@@ -60,8 +62,25 @@ class Ground {
   Extent bounds_;
 };
 
+/// Whether two coordinate systems are the same, whatever the order of their axes.
+bool SameSystem(const OGRSpatialReference& a, const OGRSpatialReference& b);
+
 /// Throws `RunError` unless both images name the same coordinate system, or neither names one.
 void RequireSameSystem(const RasterSource& first, const RasterSource& other);
+
+/// Throws `RunError` unless both have one sample type, number of channels and coordinate system.
+void RequireComparable(const RasterSource& first, const RasterSource& other);
+
+/// A place on the pixel grid of a raster.
+struct GridPlace {
+  std::int64_t column = 0;
+  std::int64_t row = 0;
+};
+
+/// Where the first pixel of `other` lies on the grid of `first`. Throws `RunError` unless its
+/// pixels fall on whole pixels there, to a tenth of a pixel at every corner, in the same coordinate
+/// system. Images without georeference are taken to lie on one another and must be of one size.
+GridPlace PlaceOnGrid(const RasterSource& first, const RasterSource& other);
 
 /// The grounds of images that are to be compared pixel by pixel. Throws `RunError` unless all have
 /// the sample type, the number of channels and the coordinate system of the first one. Images

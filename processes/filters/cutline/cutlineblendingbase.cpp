@@ -57,7 +57,7 @@ void CutlineBlendingBase::SetOffset(std::uint32_t x, std::uint32_t y) {
 void CutlineBlendingBase::SetSourceMap(gobs::Raster* map, int channel, long value) {
   sourceMap = map;
   sourceMapChannel = channel;
-  sourceMapValue = static_cast<std::int32_t>(value);
+  sourceMapValue = value;
 }
 
 void CutlineBlendingBase::SetStopOnNodata(bool stop) { stopOnNoData = stop; }

@@ -19,18 +19,19 @@ class PolygonRowIndex;
 ///
 /// Each pixel has a weight w: its distance to the cutline in units of the blend width, negative
 /// outside. Pixels with w >= 1 are copied, those with w <= -1 stay, and between them
-/// `source * a + mosaic * (1 - a)` with a = (w + 1) / 2 is computed in double and truncated towards
-/// zero. Without a blend width w is 1 inside and -1 outside. A second polygon, the tile, limits the
-/// area with a hard edge. Without any polygon all pixels are copied.
+/// `source * a + mosaic * (1 - a)` with a = (w + 1) / 2 is computed in double and converted, for
+/// integers by truncation towards zero. Without a blend width w is 1 inside and -1 outside. A
+/// second polygon, the tile, limits the area with a hard edge. Without any polygon all pixels are
+/// copied.
 ///
 /// | | |
 /// |---|---|
 /// | sample types | integers up to 32 bits, float, double, complex of short and of float |
-/// | blocks | equal in size, channels, type, margins and origin; rows are taken from the first
-/// sample on, so blocks have no margins | | source pixel excluded | input no-data in all channels,
-/// or mask byte 0: the mosaic's pixel stays | | mosaic pixel without data | output no-data in all
-/// channels: inside the band the source is copied | | complex | both parts are blended; a no-data
-/// value is the real part, the imaginary one is 0 | | parallel | from 129 rows on |
+/// | blocks | equal in size, channels, type, margins and origin, and without margins |
+/// | source pixel excluded | input no-data in all channels, or mask byte 0: the mosaic's stays |
+/// | mosaic pixel without data | output no-data in all channels: the band copies the source |
+/// | complex | both parts are blended; a no-data value is the real part, the imaginary one is 0 |
+/// | parallel | from 129 rows on |
 ///
 /// Messages: "Raster dimensions don't match."; "Unknown raster block data type for color
 /// balancing", also for the source map; "Invalid source map size", also for a channel that the map
@@ -76,7 +77,7 @@ class ZARN_FILTERS_EXPORT CutlineBlendingBase : public IFilter {
   std::uint32_t offsetY = 0;
   gobs::Raster* sourceMap = nullptr;
   std::int32_t sourceMapChannel = 0;
-  std::int32_t sourceMapValue = 0;
+  long sourceMapValue = 0;
   bool stopOnNoData = false;
 };
 

@@ -7,12 +7,14 @@
 #include <span>
 
 #if ZARN_SIMD
-#include "processes/filters/cutline/distancerows_simd.h"
 #include "processes/filters/framework/samplerows_simd.h"
 #endif
 
 namespace zarn::processes::filters {
 namespace {
+
+// Fewer groups are not worth an order or bounds.
+constexpr std::size_t kMany = 16;
 
 bool UseVectors() {
 #if ZARN_SIMD
@@ -31,6 +33,9 @@ DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std:
       width_(width),
       reach_(index.Blend() + index.DistanceTolerance()),
       groups_(mostGroups),
+      bounds_(width),
+      narrow_(mostGroups),
+      narrowWords_(WordsFor(WordsFor(width))),
       near_(mostGroups),
       ordered_(mostGroups),
       vectors_(UseVectors()),
@@ -45,8 +50,99 @@ void DistanceRows::Prepare(std::int64_t first, std::int64_t last) {
     const double dy = edge.y1 - edge.y0;
     const double half = std::sqrt(dx * dx + dy * dy) / std::abs(dy) * reach_ * (1 + 1e-9) +
                         index_.DistanceTolerance();
-    groups_[count_++] = {&group, dx / dy, half};
+    groups_[count_++] = {&group, dx / dy, half, {0, width_}};
   });
+  narrowCount_ = 0;
+  std::fill(narrowWords_.begin(), narrowWords_.end(), 0);
+  if (count_ <= kMany) return;
+  rows_ = {first, last};
+  BoundDistances();
+  Trim();
+}
+
+// A bound for the distance of one place of each edge goes up by one from column to column.
+void DistanceRows::BoundDistances() {
+  std::fill(bounds_.begin(), bounds_.end(), reach_);
+  for (std::size_t g = 0; g < count_; ++g) {
+    const PolygonEdge& edge = index_.Edges()[groups_[g].group->begin];
+    if (edge.firstBand > rows_.first || edge.lastBand < rows_.last) continue;
+    double x = edge.x0;
+    double far = std::max(std::abs(edge.y0 - Top()), std::abs(edge.y0 - Bottom()));
+    if (std::min(edge.y0, edge.y1) <= Top() && std::max(edge.y0, edge.y1) >= Bottom()) {
+      const double upper = groups_[g].XAt(edge, Top());
+      const double lower = groups_[g].XAt(edge, Bottom());
+      x = (upper + lower) / 2;
+      far = std::abs(upper - lower) / 2;
+    }
+    const double column = std::clamp(std::floor(x - left_), 0.0, static_cast<double>(width_ - 1));
+    const double bound = far + std::abs(left_ + column + 0.5 - x);
+    if (!(bound < reach_)) continue;
+    double& known = bounds_[static_cast<std::size_t>(column)];
+    known = std::min(known, bound);
+  }
+  for (std::size_t x = 1; x < width_; ++x) bounds_[x] = std::min(bounds_[x], bounds_[x - 1] + 1);
+  for (std::size_t x = width_ - 1; x > 0; --x) {
+    bounds_[x - 1] = std::min(bounds_[x - 1], bounds_[x] + 1);
+  }
+}
+
+// Leaves out what is nearest nowhere in the rows at hand, and sets apart what is so in few columns.
+void DistanceRows::Trim() {
+  constexpr std::size_t kNarrow = 24;
+  const double farthest = *std::max_element(bounds_.begin(), bounds_.end());
+  std::size_t kept = 0;
+  for (std::size_t g = 0; g < count_; ++g) {
+    Prepared prepared = groups_[g];
+    const PolygonRowIndex::Group& group = *prepared.group;
+    const double apart = std::max({group.minY - Bottom(), Top() - group.maxY, 0.0});
+    if (apart > farthest + Slack()) continue;
+    if (apart == 0) prepared.columns = NeededColumns(prepared);
+    const auto [first, end] = prepared.columns;
+    if (first >= end) continue;
+    if (!vectors_ || group.end - group.begin > 1 || end - first > kNarrow) {
+      groups_[kept++] = prepared;
+      continue;
+    }
+    const PolygonEdge& edge = index_.Edges()[group.begin];
+    narrow_[narrowCount_++] = {edge.x0,
+                               edge.y0,
+                               edge.x1,
+                               edge.y1,
+                               edge.firstBand,
+                               edge.lastBand,
+                               static_cast<std::uint32_t>(first),
+                               static_cast<std::uint32_t>(end)};
+    for (std::size_t w = first / kWordColumns; w * kWordColumns < end; ++w) {
+      narrowWords_[w / kWordColumns] |= std::uint64_t{1} << w % kWordColumns;
+    }
+  }
+  count_ = kept;
+}
+
+// Of a group beside the rows: the columns of its part that they are within reach of, and to both
+// sides those that it is not farther from than their bounds. Beyond the first that it is farther
+// from it is so all the more: its distance goes up by one from column to column, no bound by more.
+DistanceRows::Columns DistanceRows::NeededColumns(const Prepared& prepared) const {
+  const PolygonRowIndex::Group& group = *prepared.group;
+  double low = group.minX;
+  double high = group.maxX;
+  if (group.end - group.begin == 1) {
+    const PolygonEdge& edge = index_.Edges()[group.begin];
+    const double upper = prepared.XAt(edge, std::max(group.minY, Top() - reach_));
+    const double lower = prepared.XAt(edge, std::min(group.maxY, Bottom() + reach_));
+    low = std::max(low, std::min(upper, lower));
+    high = std::min(high, std::max(upper, lower));
+  }
+  Columns columns = Held(low, high);
+  const auto centre = [&](std::size_t x) { return left_ + static_cast<double>(x) + 0.5; };
+  while (columns.first > 0 &&
+         low - centre(columns.first - 1) <= bounds_[columns.first - 1] + Slack()) {
+    --columns.first;
+  }
+  while (columns.end < width_ && centre(columns.end) - high <= bounds_[columns.end] + Slack()) {
+    ++columns.end;
+  }
+  return columns;
 }
 
 // The columns whose centres may lie between the two; what is not a number sets no end.
@@ -72,13 +168,21 @@ DistanceRows::Near DistanceRows::Reach(const Prepared& prepared, double y) const
     // A long edge is near only where the row passes between two parallels to it. (A comparison with
     // what is not a number changes nothing.)
     const PolygonEdge& edge = index_.Edges()[group.begin];
-    const double crossing = edge.x0 + prepared.slope * (y - edge.y0);
+    const double crossing = prepared.XAt(edge, y);
     low = std::max(low, crossing - prepared.half);
     high = std::min(high, crossing + prepared.half);
     ownLow = std::max(ownLow, crossing - 1);
     ownHigh = std::min(ownHigh, crossing + 1);
   }
-  return {&group, above, Held(low, high), Held(ownLow, ownHigh)};
+  Columns columns = Held(low, high);
+  columns.first = std::max(columns.first, prepared.columns.first);
+  columns.end = std::min(columns.end, prepared.columns.end);
+  return {&group, above, columns, Held(ownLow, ownHigh)};
+}
+
+void DistanceRows::ClearWord(std::size_t word) {
+  std::fill_n(distances_.begin() + static_cast<std::ptrdiff_t>(word * kWordColumns), kWordColumns,
+              std::numeric_limits<double>::infinity());
 }
 
 // Makes the words of these columns ready for use.
@@ -88,9 +192,19 @@ void DistanceRows::Touch(Columns columns) {
     const std::uint64_t bit = std::uint64_t{1} << w % kWordColumns;
     if ((bits & bit) != 0) continue;
     bits |= bit;
-    std::fill_n(distances_.begin() + static_cast<std::ptrdiff_t>(w * kWordColumns), kWordColumns,
-                std::numeric_limits<double>::infinity());
+    ClearWord(w);
   }
+}
+
+void DistanceRows::LowerNarrow([[maybe_unused]] std::int64_t row) {
+  if (narrowCount_ == 0) return;
+#if ZARN_SIMD
+  touched_ = narrowWords_;
+  ForEachRun(touched_, [&](std::size_t first, std::size_t end) {
+    for (std::size_t w = first; w < end; ++w) ClearWord(w);
+  });
+  LowerNarrowDistances(narrow_.data(), narrowCount_, {distances_.data(), left_, row});
+#endif
 }
 
 void DistanceRows::CollectNear(std::int64_t row, double y) {
@@ -150,9 +264,8 @@ void DistanceRows::Lower(const Near& near, Columns columns, std::int64_t row) {
 void DistanceRows::Compute(std::int64_t row, const PixelBits& inside, PixelBits& band) {
   std::fill(band.begin(), band.end(), 0);
   std::fill(touched_.begin(), touched_.end(), 0);
+  LowerNarrow(row);
   CollectNear(row, static_cast<double>(row) + 0.5);
-  // Few groups are not worth the order.
-  constexpr std::size_t kMany = 16;
   if (vectors_ && nearCount_ > kMany) {
     OrderNear();
     // First every group where it is itself, then the wider reach of each, most of which is nearer

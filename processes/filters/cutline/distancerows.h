@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <vector>
 
+#include "processes/filters/cutline/distancerows_simd.h"
 #include "processes/filters/cutline/pixelbits.h"
 #include "processes/filters/cutline/polygonrowindex.h"
 
@@ -14,7 +15,9 @@ namespace zarn::processes::filters {
 /// `PolygonRowIndex::DistanceToEdge` gives them.
 ///
 /// Each edge lowers the squared distances of the columns that it may be near to; pixels farther
-/// than the blend width from all edges are either copied or left, whatever their distance.
+/// than the blend width from all edges are either copied or left, whatever their distance. For some
+/// rows at a time every column gets a bound that its pixels are not farther away than, and an edge
+/// is looked at in those columns only where it may be nearer.
 class DistanceRows {
  public:
   /// For rows of `width` pixels from column `left` on. Keeps the address of `index`; `mostGroups`
@@ -40,6 +43,13 @@ class DistanceRows {
     // reach of its line extend in a row. Infinite or no number where it is horizontal.
     double slope;
     double half;
+    Columns columns;  // no row at hand needs it elsewhere
+
+    double XAt(const PolygonEdge& edge, double y) const { return edge.x0 + slope * (y - edge.y0); }
+  };
+  struct Rows {
+    std::int64_t first;
+    std::int64_t last;
   };
   // A group that the row at hand is within reach of.
   struct Near {
@@ -49,9 +59,20 @@ class DistanceRows {
     Columns own;  // where the row meets the group itself
   };
 
+  // The centres of the first and the last of the rows at hand.
+  double Top() const { return static_cast<double>(rows_.first) + 0.5; }
+  double Bottom() const { return static_cast<double>(rows_.last) + 0.5; }
+  // What two distances may be taken for each other by.
+  double Slack() const { return 4 * index_.DistanceTolerance(); }
+
+  void BoundDistances();
+  void Trim();
+  Columns NeededColumns(const Prepared& prepared) const;
   Near Reach(const Prepared& prepared, double y) const;
   Columns Held(double low, double high) const;
+  void ClearWord(std::size_t word);
   void Touch(Columns columns);
+  void LowerNarrow(std::int64_t row);
   void CollectNear(std::int64_t row, double y);
   void OrderNear();
   void Lower(const Near& near, Columns columns, std::int64_t row);
@@ -60,8 +81,13 @@ class DistanceRows {
   double left_;
   std::size_t width_;
   double reach_;
+  Rows rows_{};
   std::size_t count_ = 0;
   std::vector<Prepared> groups_;
+  std::vector<double> bounds_;  ///< no pixel of the rows at hand is farther from the polygon
+  std::size_t narrowCount_ = 0;
+  std::vector<NarrowEdge> narrow_;  ///< taken out of `groups_`
+  PixelBits narrowWords_;           ///< the words that they have to do with
   std::size_t nearCount_ = 0;
   std::vector<Near> near_;
   std::vector<Near> ordered_;

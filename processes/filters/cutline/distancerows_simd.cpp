@@ -20,7 +20,8 @@ using V = hn::Vec<D>;
 
 /// One edge as seen from a row.
 struct EdgeVectors {
-  HWY_INLINE EdgeVectors(D d, const PolygonEdge& edge, double y) {
+  template <typename Edge>
+  HWY_INLINE EdgeVectors(D d, const Edge& edge, double y) {
     const double edgeX = edge.x1 - edge.x0;
     const double edgeY = edge.y1 - edge.y0;
     const double fromY = y - edge.y0;
@@ -116,6 +117,22 @@ HWY_ATTR void Lower(const NearEdges& near, std::size_t first, std::size_t end,
   }
 }
 
+HWY_ATTR void LowerNarrow(const NarrowEdge* edges, std::size_t count, const DistanceRow& row) {
+  const D d;
+  const std::size_t lanes = hn::Lanes(d);
+  const double y = static_cast<double>(row.row) + 0.5;
+  const V half = hn::Set(d, 0.5);
+  const V lane = hn::Iota(d, 0);
+  for (const NarrowEdge* e = edges; e < edges + count; ++e) {
+    if (row.row < e->firstRow || row.row > e->lastRow) continue;
+    const EdgeVectors edge(d, *e, y);
+    for (std::size_t i = e->firstColumn - e->firstColumn % lanes; i < e->endColumn; i += lanes) {
+      const V x = hn::Add(hn::Add(hn::Set(d, row.left + static_cast<double>(i)), lane), half);
+      hn::StoreU(edge.Lower(d, x, hn::LoadU(d, row.squared + i)), d, row.squared + i);
+    }
+  }
+}
+
 HWY_ATTR std::uint64_t Weigh(double* squared, std::uint64_t inside, double blend) {
   const D d;
   const std::size_t lanes = hn::Lanes(d);
@@ -145,6 +162,11 @@ HWY_EXPORT(Lower);
 void LowerDistances(const NearEdges& near, std::size_t first, std::size_t end,
                     const DistanceRow& row) {
   HWY_DYNAMIC_DISPATCH(Lower)(near, first, end, row);
+}
+
+HWY_EXPORT(LowerNarrow);
+void LowerNarrowDistances(const NarrowEdge* edges, std::size_t count, const DistanceRow& row) {
+  HWY_DYNAMIC_DISPATCH(LowerNarrow)(edges, count, row);
 }
 
 HWY_EXPORT(Weigh);

@@ -32,6 +32,21 @@ struct NearEdges {
 void LowerDistances(const NearEdges& near, std::size_t first, std::size_t end,
                     const DistanceRow& row);
 
+/// An edge that few columns of some rows have to do with.
+struct NarrowEdge {
+  double x0;
+  double y0;
+  double x1;
+  double y1;
+  std::int64_t firstRow;
+  std::int64_t lastRow;
+  std::uint32_t firstColumn;
+  std::uint32_t endColumn;
+};
+
+/// Does the same for each of `edges` whose rows the row is among, in the edge's own columns.
+void LowerNarrowDistances(const NarrowEdge* edges, std::size_t count, const DistanceRow& row);
+
 /// Turns the squared distances of one word into weights, negative where the pixel is not inside.
 /// Returns the bits of those between -1 and 1.
 std::uint64_t WeighDistances(double* squared, std::uint64_t inside, double blend);

@@ -35,7 +35,7 @@ class PolygonRowIndex {
 
   // The definition, pixel by pixel. Points are pixel centres.
 
-  /// Even-odd rule with a ray towards +x. A point on an edge is inside.
+  /// Even-odd rule with a ray towards +x. An edge that the point lies on counts as crossed.
   bool IsInside(double x, double y) const;
   /// The distance to the nearest edge that the row of `y` has to do with; infinite without one.
   double DistanceToEdge(double x, double y) const;

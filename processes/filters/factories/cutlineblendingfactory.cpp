@@ -110,6 +110,9 @@ const PolygonParam& CutlineBlendingFactory::GetCutlineParam() const { return cut
 const PolygonParam& CutlineBlendingFactory::GetTileParam() const { return tile_->param; }
 
 void CutlineBlendingFactory::SetTilePolygon(const PolygonParam& tile) {
+  // Arrays that copies share have an owner already.
+  const PolygonParam& held = tile_->param;
+  if (tile.Exists() && tile.vertices == held.vertices && tile.parts == held.parts) return;
   auto next = std::make_shared<OwnedPolygon>(tile);
   if (tile_.use_count() == 1) tile_->param = {};
   tile_ = std::move(next);

@@ -19,7 +19,8 @@ class ZARN_FILTERS_EXPORT CutlineBlendingFactory : public IFilterFactory {
   /// Takes the arrays of `cutline` over without copying them: they come from array new, as those of
   /// `CreatePolygonParam` do. `blend` is the width of the band on each side, in pixels.
   CutlineBlendingFactory(const PolygonParam& cutline, unsigned int blend);
-  /// Copies share the arrays, which are released with the last of them.
+  /// Copies share the arrays, which are released with the last of them; so are, on assignment,
+  /// those that were held before.
   CutlineBlendingFactory(const CutlineBlendingFactory& other);
   CutlineBlendingFactory& operator=(const CutlineBlendingFactory& other);
   ~CutlineBlendingFactory() override;
@@ -38,10 +39,11 @@ class ZARN_FILTERS_EXPORT CutlineBlendingFactory : public IFilterFactory {
   const PolygonParam& GetCutlineParam() const;
   const PolygonParam& GetTileParam() const;
   /// Replaces the tile polygon and takes its arrays over. Those of the previous one go back to the
-  /// caller, unless a copy of the factory still holds them.
+  /// caller, unless a copy of the factory still holds them or they are the same.
   void SetTilePolygon(const PolygonParam& tile);
 
-  /// Copies the polygons.
+  /// Copies the polygons. The filter is always a `CutlineBlendingBase`; cast it statically to set
+  /// what that offers.
   IFilter* GetCPUFilter() const override;
 
  private:

@@ -64,6 +64,14 @@ TEST_P(DistanceKernels, GiveTheBitsOfTheDefinition) {
                     .maxX = maxX + slack,
                     .above = std::max(above - slack, 0.0)},
                    first, end, {.squared = lowered.data(), .left = at.left, .row = at.row});
+    std::vector<NarrowEdge> narrow;
+    for (const PolygonEdge& e : edges) {
+      narrow.push_back({e.x0, e.y0, e.x1, e.y1, e.firstBand, e.lastBand,
+                        static_cast<std::uint32_t>(first), static_cast<std::uint32_t>(end)});
+    }
+    std::vector<double> narrowed = known;
+    LowerNarrowDistances(narrow.data(), narrow.size(),
+                         {.squared = narrowed.data(), .left = at.left, .row = at.row});
     for (std::size_t i = 0; i < kColumns; ++i) {
       double smallest = known[i];
       for (const PolygonEdge& edge : edges) {
@@ -72,8 +80,10 @@ TEST_P(DistanceKernels, GiveTheBitsOfTheDefinition) {
       }
       if (i < first || i >= end) {
         ASSERT_TRUE(lowered[i] == known[i] || lowered[i] == smallest);
+        ASSERT_TRUE(narrowed[i] == known[i] || narrowed[i] == smallest);
       } else {
         ASSERT_EQ(lowered[i], smallest) << "round " << round << " column " << i;
+        ASSERT_EQ(narrowed[i], smallest) << "round " << round << " column " << i;
       }
     }
     const std::uint64_t inside = random.Next();
