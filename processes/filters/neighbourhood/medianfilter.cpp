@@ -9,6 +9,9 @@
 #include "processes/filters/framework/sampletypes.h"
 #include "processes/filters/neighbourhood/medianrows.h"
 #include "processes/filters/neighbourhood/windowbands.h"
+#if ZARN_SIMD
+#include "processes/filters/neighbourhood/medianfilter_simd.h"
+#endif
 
 namespace zarn::processes::filters {
 namespace {
@@ -17,9 +20,16 @@ constexpr const char* kWindowTooLarge = "Only filters of 7x7 or smaller are supp
 
 template <typename T>
 void MedianBlock(const MedianJob<T>& job) {
+#if ZARN_SIMD
+  ForEachWindowBand(job.output.Height(), MedianScratchBytes(job),
+                    [&](std::ptrdiff_t begin, std::ptrdiff_t end, std::byte* scratch) {
+                      MedianRowsSimd(job, begin, end, scratch);
+                    });
+#else
   ForEachWindowBand(
       job.output.Height(), 0,
       [&](std::ptrdiff_t begin, std::ptrdiff_t end, std::byte*) { MedianRows(job, begin, end); });
+#endif
 }
 
 }  // namespace

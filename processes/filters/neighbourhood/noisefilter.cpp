@@ -9,6 +9,9 @@
 #include "processes/filters/framework/sampletypes.h"
 #include "processes/filters/neighbourhood/noiserows.h"
 #include "processes/filters/neighbourhood/windowbands.h"
+#if ZARN_SIMD
+#include "processes/filters/neighbourhood/noisefilter_simd.h"
+#endif
 
 namespace zarn::processes::filters {
 namespace {
@@ -17,9 +20,16 @@ constexpr const char* kUnknownType = "Unknown raster block data type for noise f
 
 template <typename T>
 void FilterBlock(const NoiseJob<T>& job) {
+#if ZARN_SIMD
+  ForEachWindowBand(job.output.Height(), NoiseScratchBytes(job),
+                    [&](std::ptrdiff_t begin, std::ptrdiff_t end, std::byte* scratch) {
+                      NoiseRowsSimd(job, begin, end, scratch);
+                    });
+#else
   ForEachWindowBand(
       job.output.Height(), 0,
       [&](std::ptrdiff_t begin, std::ptrdiff_t end, std::byte*) { NoiseRows(job, begin, end); });
+#endif
 }
 
 }  // namespace

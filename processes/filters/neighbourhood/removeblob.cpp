@@ -13,6 +13,9 @@
 #include "processes/filters/neighbourhood/openingrows.h"
 #include "processes/filters/neighbourhood/windowbands.h"
 #include "processes/filters/neighbourhood/windowjob.h"
+#if ZARN_SIMD
+#include "processes/filters/framework/samplerows_simd.h"
+#endif
 
 namespace zarn::processes::filters {
 namespace {
@@ -33,7 +36,7 @@ class BlobBand {
  public:
   static std::size_t ScratchBytes(const BitRowLayout& layout) {
     return (2 * SquareUnion::Words(layout) + (layout.taps + 3) * layout.words) * sizeof(Word) +
-           layout.words * bitrows::kWordBits;
+           FlagBytes(layout);
   }
 
   BlobBand(const BlobJob<T>& job, const BitRowLayout& layout, std::byte* scratch)
@@ -60,6 +63,10 @@ class BlobBand {
   }
 
  private:
+  // Flags of whole vectors may be written.
+  static std::size_t FlagBytes(const BitRowLayout& layout) {
+    return layout.words * bitrows::kWordBits + 64;
+  }
   Word* Take(std::size_t words) {
     Word* const place = words_;
     words_ += words;
@@ -80,10 +87,21 @@ class BlobBand {
 
   // The pixels of a row that equal the value in all channels.
   void PackEqual(const T* row, const T* value, Word* bits) {
-    const std::size_t channels = static_cast<std::size_t>(job_.input.Channels());
+    const auto channels = static_cast<std::size_t>(job_.input.Channels());
+    if constexpr (sizeof(T) == 1) {
+      if (channels == 1) {
+        bitrows::Pack(reinterpret_cast<const std::uint8_t*>(row), layout_.width,
+                      static_cast<std::uint8_t>(*value), true, bits);
+        return;
+      }
+    }
+#if ZARN_SIMD
+    FlagEqual(row, layout_.width, channels, value, flags_);
+#else
     for (std::size_t x = 0; x < layout_.width; ++x) {
       flags_[x] = PixelEquals(row + x * channels, value, channels) ? 1 : 0;
     }
+#endif
     bitrows::Pack(flags_, layout_.width, 1, true, bits);
   }
 

@@ -80,7 +80,7 @@ TYPED_TEST_SUITE(AverageKernelsTest, testsupport::HandledTypes, testsupport::Typ
 
 TYPED_TEST(AverageKernelsTest, AgreesWithTheReferenceOnRandomScenes) {
   for (std::uint64_t seed = 0; seed < 2500; ++seed) {
-    ASSERT_TRUE(testsupport::AgreesOnScene<TestedAverage, TypeParam>(seed));
+    ASSERT_TRUE((testsupport::AgreesOnScene<TestedAverage, TypeParam>(seed)));
   }
 }
 

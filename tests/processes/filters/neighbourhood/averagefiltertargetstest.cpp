@@ -26,7 +26,7 @@ class AverageTargetsTest : public ::testing::TestWithParam<std::int64_t> {
   template <typename T>
   static void CompareScenes() {
     for (std::uint64_t seed = 50000; seed < 50600; ++seed) {
-      ASSERT_TRUE(AgreesOnScene<TestedAverage, T>(seed));
+      ASSERT_TRUE((AgreesOnScene<TestedAverage, T>(seed)));
     }
   }
 

@@ -1,15 +1,24 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <gtest/gtest.h>
 
+#include <cstddef>
 #include <cstdint>
+#include <limits>
+#include <utility>
 #include <vector>
 
+#include "tests/support/randomnumbers.h"
+#include "tests/support/vectortargets.h"
 #include "tests/support/windowfiltering.h"
 
 namespace zarn::processes::filters {
 namespace {
 
+using testsupport::AgreesWithReference;
 using testsupport::FilterWindows;
+using testsupport::ForEachVectorTarget;
+using testsupport::RandomNumbers;
+using testsupport::Shape;
 using testsupport::TestBlock;
 using testsupport::TestedNoise;
 using testsupport::WindowParameters;
@@ -84,6 +93,40 @@ TEST(NoiseFilter, JudgesEachChannelOfThePixelsThatCount) {
                                          {}, output)
                   .Ok());
   EXPECT_EQ(output.At(0, 0, 1), 1);
+}
+
+// Few neighbouring values, at either end of the type: many samples lie exactly on the bound, or so
+// near that the rounding of the formula decides.
+template <typename T>
+void CompareOnTheBound() {
+  RandomNumbers random(11);
+  for (const int size : {3, 5, 13, 15, 63}) {
+    const auto half = static_cast<std::uint32_t>(size / 2);
+    const Shape shape{
+        .width = size > 15 ? 20U : 200U, .height = 6, .marginX = half, .marginY = half};
+    TestBlock<T> input(shape);
+    const TestBlock<T> output({.width = shape.width, .height = shape.height});
+    for (const std::uint32_t base : {1U, std::uint32_t{std::numeric_limits<T>::max()} - 7}) {
+      for (const std::uint32_t values : {2U, 3U, 7U}) {
+        for (const std::uint32_t rare : {3U, 50U}) {
+          for (std::size_t i = 0; i < input.SampleCount(); ++i) {
+            input.Samples()[i] =
+                static_cast<T>(base + (random.Percent(rare) ? random.Below(values) : 0));
+          }
+          ForEachVectorTarget([&] {
+            ASSERT_TRUE(AgreesWithReference<TestedNoise>({.kernelSize = size, .background = 0},
+                                                         input, {}, output))
+                << "size " << size << ", base " << base << ", values " << values;
+          });
+        }
+      }
+    }
+  }
+}
+
+TEST(NoiseFilter, DecidesOnTheBoundAsTheFormulaDoes) {
+  CompareOnTheBound<std::uint8_t>();
+  CompareOnTheBound<std::uint16_t>();
 }
 
 }  // namespace
