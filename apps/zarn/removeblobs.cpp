@@ -46,7 +46,7 @@ class BlobWindows {
     gobs::Raster filtered(filteredInfo, filtered_.data(), filtered_.size());
     filters::FilterResult result = filter_->Process(larger, filtered, 0, 0, blocks.valid);
     if (!result.Ok()) return result;
-    const std::size_t pixelBytes = input.Type().BytesPerSample() * input.Channels();
+    const std::size_t pixelBytes = std::size_t{input.Type().BytesPerSample()} * input.Channels();
     const std::size_t rowBytes = input.Width() * pixelBytes;
     auto* const output = static_cast<std::byte*>(blocks.output.Data());
     for (std::size_t y = 0; y < input.Height(); ++y) {
