@@ -55,13 +55,14 @@ TEST(AverageFilterFactory, CopiesBothParameters) {
 // The results tell the kernel size and the background value apart, and the families.
 template <class Factory>
 void ExpectFingerprints(const std::string& pixelAlone, const std::string& zero,
-                        const std::string& thirty) {
+                        const std::string& thirty, const std::string& aloneWithThirty) {
   const Factory small(1, 0);
   const Factory withZero(3, 0);
   const Factory withThirty(3, 30);
   EXPECT_EQ(Fingerprint(small), pixelAlone);
   EXPECT_EQ(Fingerprint(withZero), zero);
   EXPECT_EQ(Fingerprint(withThirty), thirty);
+  EXPECT_EQ(Fingerprint(Factory(1, 30)), aloneWithThirty);
   Factory copy(withThirty);
   EXPECT_EQ(Fingerprint(copy), thirty);
   copy = withZero;
@@ -72,10 +73,10 @@ void ExpectFingerprints(const std::string& pixelAlone, const std::string& zero,
 }
 
 TEST(WindowFilterFactories, HandTheirParametersOn) {
-  ExpectFingerprints<AverageFilterFactory>("8", "10", "8");
-  ExpectFingerprints<MedianFilterFactory>("8", "8", "8");
-  ExpectFingerprints<NoiseFilterFactory>("0", "8", "30");
-  ExpectFingerprints<RemoveBlobFactory>("8", "0", "30");
+  ExpectFingerprints<AverageFilterFactory>("8", "10", "8", "8");
+  ExpectFingerprints<MedianFilterFactory>("8", "8", "8", "8");
+  ExpectFingerprints<NoiseFilterFactory>("0", "8", "8", "30");
+  ExpectFingerprints<RemoveBlobFactory>("8", "0", "30", "8");
 }
 
 TEST(AverageFilterFactory, FiltersAreIndependentAndOutliveIt) {
