@@ -169,14 +169,16 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
   int blockWidth = 1;
   int blockHeight = 1;
   output.Dataset().GetRasterBand(1)->GetBlockSize(&blockWidth, &blockHeight);
-  const WindowPlan plan({.image = {source.Width(), source.Height()},
-                         .outputBlock = {blockWidth, blockHeight},
-                         .halo = fitted.halo,
-                         .sampleBytes = reader.SampleBytes(),
-                         .sideBytes = reader.SideBytes(),
-                         .slots = kStreamSlots,
-                         .memory = static_cast<std::size_t>(options.memory) << 20,
-                         .forced = forcedWindow});
+  const WindowPlan plan(
+      {.image = {source.Width(), source.Height()},
+       .outputBlock = {blockWidth, blockHeight},
+       .halo = fitted.halo,
+       .sampleBytes = reader.SampleBytes(),
+       // Only one window is filtered at a time.
+       .sideBytes = reader.SideBytes() + (fitted.filterBytes + kStreamSlots - 1) / kStreamSlots,
+       .slots = kStreamSlots,
+       .memory = static_cast<std::size_t>(options.memory) << 20,
+       .forced = forcedWindow});
   FitBlockCache(source, plan, fitted.halo);
 
   const sys::OMPThreadCount threads(options.threads > 0 ? options.threads

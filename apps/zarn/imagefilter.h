@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <memory>
@@ -77,8 +78,9 @@ struct FittedFilter {
   std::int64_t halo = 0;  ///< pixels that it needs around a window on every side
   std::unique_ptr<LabelFile> labels = nullptr;     ///< read beside the image, or null
   std::unique_ptr<MaskFile> outputMask = nullptr;  ///< names pixels to be left alone, or null
-  bool marksNoData = false;                        ///< as `BlockRequest` has it
-  bool protectsInvalid = false;                    ///< as `BlockRequest` has it
+  std::size_t filterBytes = 0;   ///< what the filter itself holds for each pixel of a block
+  bool marksNoData = false;      ///< as `BlockRequest` has it
+  bool protectsInvalid = false;  ///< as `BlockRequest` has it
 };
 
 /// How a command makes its filter once the image is open.

@@ -23,9 +23,12 @@
 #include "apps/zarn/hotspot.h"
 #include "apps/zarn/interruption.h"
 #include "apps/zarn/lut.h"
+#include "apps/zarn/median.h"
 #include "apps/zarn/minmaxlut.h"
 #include "apps/zarn/morph.h"
+#include "apps/zarn/noisefilter.h"
 #include "apps/zarn/polynomial.h"
+#include "apps/zarn/removeblobs.h"
 #include "apps/zarn/resample.h"
 #include "apps/zarn/sample.h"
 #include "apps/zarn/segmentfilter.h"
@@ -61,11 +64,14 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddFitHotSpotCommand(app);
   zarn::app::AddGainOffsetCommand(app);
   zarn::app::AddLutCommand(app);
+  zarn::app::AddMedianCommand(app);
   zarn::app::AddMinMaxLutCommand(app);
   zarn::app::AddMorphCommand(app);
+  zarn::app::AddNoiseCommand(app);
   zarn::app::AddPolynomialCommand(app);
   zarn::app::AddDodgeCommand(app);
   zarn::app::AddHotSpotCommand(app);
+  zarn::app::AddRemoveBlobsCommand(app);
   zarn::app::AddResampleCommand(app);
   zarn::app::AddShiftCommand(app);
   zarn::app::AddSampleCommand(app);

@@ -59,10 +59,11 @@ class Paster {
     filter_->SetNoDataValues(&pasting.sourceNoData, &pasting.mosaicNoData);
     filter_->SetStopOnNodata(pasting.stopOnNoData);
     if (map == nullptr) return;
-    VisitAnySampleType(map->Source().Type().code, [&]<typename T>(std::type_identity<T>) {
-      const T id = static_cast<T>(pasting.sourceId);
-      std::memcpy(id_.data(), &id, sizeof(T));
-    });
+    VisitAnySampleType(map->Source().Type().code,
+                       [&]<typename T>(std::type_identity<T>, std::size_t) {
+                         const T id = static_cast<T>(pasting.sourceId);
+                         std::memcpy(id_.data(), &id, sizeof(T));
+                       });
   }
 
   std::size_t SampleBytes() const { return reader_.SampleBytes(); }
@@ -235,7 +236,7 @@ class Paster {
   Plane& SourceAlphas(Slot& slot) {
     if (slot.source.alphas.Used()) return slot.source.alphas;
     opaque_.Shape(slot.window.width, slot.window.height, AlphaBytes());
-    VisitAnySampleType(source_.Type().code, [&]<typename T>(std::type_identity<T>) {
+    VisitAnySampleType(source_.Type().code, [&]<typename T>(std::type_identity<T>, std::size_t) {
       T opaque = std::numeric_limits<T>::max();
       if constexpr (std::is_floating_point_v<T>) opaque = 255;  // as GDAL has it
       std::fill_n(reinterpret_cast<T*>(opaque_.Data()), opaque_.Size() / sizeof(T), opaque);

@@ -12,6 +12,7 @@
 
 #include "host/gobs/raster.h"
 #include "processes/filters/attribute/filteralgo.h"
+#include "tests/support/orderreference.h"
 
 // The attribute filters as plain loops: what the tests compare with, and what the benchmarks race.
 
@@ -74,15 +75,6 @@ bool ReferenceShares(A centre, A neighbour, A noData, A tolerance) {
     const auto wide = static_cast<std::int64_t>(d);
     return wide <= tolerance && (std::is_unsigned_v<A> || tolerance + wide >= 0);
   }
-}
-
-template <typename T>
-bool ReferenceOrder(T a, T b) {
-  if constexpr (std::is_floating_point_v<T>) {
-    if (std::isnan(a) || std::isnan(b)) return !std::isnan(a);
-    if (a == b) return std::signbit(a) && !std::signbit(b);
-  }
-  return a < b;
 }
 
 template <typename T>

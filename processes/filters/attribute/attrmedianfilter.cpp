@@ -6,6 +6,7 @@
 
 #include "processes/filters/attribute/filteralgo.h"
 #include "processes/filters/attribute/poolblock.h"
+#include "processes/filters/framework/messages.h"
 #include "processes/filters/framework/orderedkeys.h"
 
 namespace zarn::processes::filters {
@@ -13,7 +14,7 @@ namespace {
 
 struct Median {
   static constexpr FILTERALGO kAlgo = FILTERALGO::kMedian;
-  static constexpr const char* kUnknownType = "Unknown raster block data type for median filter.";
+  static constexpr const char* kUnknownType = messages::kUnknownMedianType;
   static constexpr const char* kUnknownAttributeType =
       "Unknown attribute raster data type for median filter.";
 

@@ -16,6 +16,7 @@
 
 #if HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128
 #include "processes/filters/attribute/poolsums_simd.h"
+#include "processes/filters/framework/orderedkeys_simd.h"
 #include "processes/filters/framework/sortingnetwork_simd.h"
 #endif
 
@@ -60,11 +61,7 @@ HWY_INLINE hn::Vec<D> LoadSamples(D d, const OrderedKey<T>* keys) {
   if constexpr (std::is_floating_point_v<T>) {
     const hn::Rebind<OrderedKey<T>, D> du;
     const hn::Rebind<T, D> dt;
-    const auto top = hn::Set(du, kTopBit<T>);
-    const auto bits = hn::Add(hn::LoadU(du, keys), hn::Set(du, kSignedNaNs<T>));
-    const auto negative = hn::Eq(hn::And(bits, top), hn::Zero(du));
-    const auto samples =
-        hn::BitCast(dt, hn::IfThenElse(negative, hn::Not(bits), hn::Xor(bits, top)));
+    const auto samples = hn::BitCast(dt, BitsOfKeys<T>(du, hn::LoadU(du, keys)));
     if constexpr (std::is_same_v<T, double>) {
       return samples;
     } else {

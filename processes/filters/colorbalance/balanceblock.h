@@ -25,9 +25,7 @@ inline blockchecks::Refusal CheckBalanced(const gobs::Raster& input, const gobs:
                                           const std::vector<double>& inputNoData,
                                           const std::vector<double>& outputNoData,
                                           std::size_t parameters) {
-  if (input.Width() != output.Width() || input.Height() != output.Height()) {
-    return FilterResult::Failure(messages::kSizesDiffer);
-  }
+  if (auto refusal = blockchecks::CheckSameSize(input, output)) return refusal;
   return blockchecks::CheckBlocks(input, output, inputNoData, outputNoData,
                                   blockchecks::Aliasing::kSameBlockAllowed, parameters);
 }

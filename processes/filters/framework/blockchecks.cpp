@@ -30,6 +30,11 @@ Refusal CheckCoversOutput(const gobs::RasterInfo& input, const gobs::RasterInfo&
   return FilterResult::Failure(messages::kSizesDiffer);
 }
 
+Refusal CheckSameSize(const gobs::RasterInfo& input, const gobs::RasterInfo& output) {
+  if (input.Width() == output.Width() && input.Height() == output.Height()) return {};
+  return FilterResult::Failure(messages::kSizesDiffer);
+}
+
 Refusal CheckMargins(const gobs::RasterInfo& input, std::int64_t half) {
   if (half >= 0 && input.MarginX() >= half && input.MarginY() >= half) return {};
   return FilterResult::Failure(messages::kMarginsTooSmall);

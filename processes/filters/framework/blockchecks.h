@@ -21,6 +21,9 @@ using Refusal = std::optional<FilterResult>;
 /// Equal widths, and an input at least as high as the output (a taller input is accepted).
 Refusal CheckCoversOutput(const gobs::RasterInfo& input, const gobs::RasterInfo& output);
 
+/// Equal widths and heights.
+Refusal CheckSameSize(const gobs::RasterInfo& input, const gobs::RasterInfo& output);
+
 /// Both margins of the input reach `half` pixels; no margin is enough for a negative `half`.
 Refusal CheckMargins(const gobs::RasterInfo& input, std::int64_t half);
 

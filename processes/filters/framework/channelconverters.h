@@ -30,6 +30,11 @@ inline std::vector<ChannelBounds> TypeBounds(gobs::NativeDataTypeCode code,
   return bounds;
 }
 
+/// The same for filters that need no limits, but refuse blocks of an unknown type in that way.
+inline void RequireTypeLimits(gobs::NativeDataTypeCode code, std::uint32_t channels) {
+  TypeBounds(code, channels);
+}
+
 /// One converter for each channel; an empty no-data list avoids nothing.
 template <typename T>
 std::vector<OutputConverter<T>> MakeConverters(const std::vector<ChannelBounds>& bounds,

@@ -15,6 +15,8 @@ inline constexpr const char* kInconsistentBlock =
     "Raster block has no data or an inconsistent size.";
 inline constexpr const char* kUnknownBalancedType =
     "Unknown raster block data type for color balancing";
+inline constexpr const char* kUnknownMedianType =
+    "Unknown raster block data type for median filter.";
 inline constexpr const char* kOverlap = "Input and output rasters overlap.";
 
 }  // namespace zarn::processes::filters::messages

@@ -155,7 +155,7 @@ HWY_ATTR bool Flag(const T* pixels, std::size_t count, std::size_t channels, con
     };
     std::size_t i = 0;
     for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) {
-      found = hn::Or(found, flag(pixels + i * kChannels, mask + i, i));
+      found = hn::Or(found, flag(pixels + i * kChannels, mask == nullptr ? nullptr : mask + i, i));
     }
     if (i < count) {
       PixelBuffer<D, kChannels> buffer;
@@ -179,6 +179,27 @@ HWY_ATTR bool Flag(const T* pixels, std::size_t count, std::size_t channels, con
     any = any || excluded;
   }
   return any;
+}
+
+template <typename T>
+HWY_ATTR void FlagSame(const T* pixels, std::size_t count, std::size_t channels, const T* value,
+                       std::uint8_t* flags) {
+  const bool done = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
+    constexpr std::size_t kChannels = constant();
+    using D = hn::ScalableTag<T>;
+    const D d;
+    std::size_t i = 0;
+    for (; i + hn::Lanes(d) <= count; i += hn::Lanes(d)) {
+      StoreFlags(d, PixelVectors<D, kChannels>(d, pixels + i * kChannels).Equal(value), flags + i);
+    }
+    if (i == count) return;
+    PixelBuffer<D, kChannels> buffer;
+    const T* const rest = buffer.Fill(pixels + i * kChannels, count - i);
+    StoreFlags(d, PixelVectors<D, kChannels>(d, rest).Equal(value), flags + i);
+  });
+  for (std::size_t i = 0; !done && i < count; ++i) {
+    flags[i] = PixelEquals(pixels + i * channels, value, channels) ? 1 : 0;
+  }
 }
 
 #if HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128
@@ -301,6 +322,10 @@ HWY_ATTR void Replace(const std::uint8_t* flags, const T* value, std::size_t cou
                   const std::uint8_t* mask, std::uint8_t* flags) {                                 \
     return Flag(pixels, count, channels, noData, mask, flags);                                     \
   }                                                                                                \
+  void FlagSame##name(const T* pixels, std::size_t count, std::size_t channels, const T* value,    \
+                      std::uint8_t* flags) {                                                       \
+    FlagSame(pixels, count, channels, value, flags);                                               \
+  }                                                                                                \
   bool AnyNear##name(const T* samples, std::size_t count, T value) {                               \
     return AnyNear(samples, count, value);                                                         \
   }                                                                                                \
@@ -327,6 +352,7 @@ namespace zarn::processes::filters {
   HWY_EXPORT(Widen##name);                                                                         \
   HWY_EXPORT(Narrow##name);                                                                        \
   HWY_EXPORT(Flag##name);                                                                          \
+  HWY_EXPORT(FlagSame##name);                                                                      \
   HWY_EXPORT(AnyNear##name);                                                                       \
   HWY_EXPORT(Replace##name);                                                                       \
   template <>                                                                                      \
@@ -344,6 +370,11 @@ namespace zarn::processes::filters {
   ZARN_HIDDEN bool FlagExcluded(const T* pixels, std::size_t count, std::size_t channels,          \
                                 const T* noData, const std::uint8_t* mask, std::uint8_t* flags) {  \
     return HWY_DYNAMIC_DISPATCH(Flag##name)(pixels, count, channels, noData, mask, flags);         \
+  }                                                                                                \
+  template <>                                                                                      \
+  ZARN_HIDDEN void FlagEqual(const T* pixels, std::size_t count, std::size_t channels,             \
+                             const T* value, std::uint8_t* flags) {                                \
+    HWY_DYNAMIC_DISPATCH(FlagSame##name)(pixels, count, channels, value, flags);                   \
   }                                                                                                \
   template <>                                                                                      \
   ZARN_HIDDEN bool AnySampleNear(const T* samples, std::size_t count, T value) {                   \

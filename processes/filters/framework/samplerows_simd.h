@@ -46,6 +46,11 @@ template <typename T>
 bool FlagExcluded(const T* pixels, std::size_t count, std::size_t channels, const T* noData,
                   const std::uint8_t* mask, std::uint8_t* flags);
 
+/// Flags the pixels whose channels all equal `value` exactly, in a padded row.
+template <typename T>
+void FlagEqual(const T* pixels, std::size_t count, std::size_t channels, const T* value,
+               std::uint8_t* flags);
+
 /// Whether any of the samples may nearly equal `value`: false is certain, true is not.
 template <typename T>
 bool AnySampleNear(const T* samples, std::size_t count, T value);

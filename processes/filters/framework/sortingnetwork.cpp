@@ -2,29 +2,16 @@
 #include "processes/filters/framework/sortingnetwork.h"
 
 #include <algorithm>
-#include <bit>
 
 namespace zarn::processes::filters {
 namespace {
 
-// Batcher's merge exchange, which sorts any number of values.
 std::vector<Exchange> SortingNetwork(std::size_t count) {
   std::vector<Exchange> steps;
-  const std::size_t top = count < 2 ? 0 : std::bit_floor(count - 1);
-  for (std::size_t p = top; p > 0; p /= 2) {
-    std::size_t phase = 0;
-    std::size_t distance = p;
-    for (std::size_t q = top;; q /= 2) {
-      for (std::size_t i = 0; i + distance < count; ++i) {
-        if ((i & p) != phase) continue;
-        steps.push_back({static_cast<std::uint16_t>(i), static_cast<std::uint16_t>(i + distance),
-                         Exchange::Keep::kBoth});
-      }
-      if (q == p) break;
-      distance = q - p;
-      phase = p;
-    }
-  }
+  ForEachSortingStep(count, [&](std::size_t first, std::size_t second) {
+    steps.push_back({static_cast<std::uint16_t>(first), static_cast<std::uint16_t>(second),
+                     Exchange::Keep::kBoth});
+  });
   return steps;
 }
 

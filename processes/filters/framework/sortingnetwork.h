@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <bit>
 #include <cstddef>
 #include <cstdint>
 #include <vector>
@@ -20,6 +21,25 @@ struct Exchange {
 
 /// Largest number of values that a network sorts: long before that there are faster ways.
 inline constexpr std::size_t kMostSorted = 4096;
+
+/// Calls `use(first, second)` for the steps of a network that sorts `count` values: Batcher's merge
+/// exchange.
+template <class Use>
+constexpr void ForEachSortingStep(std::size_t count, const Use& use) {
+  const std::size_t top = count < 2 ? 0 : std::bit_floor(count - 1);
+  for (std::size_t p = top; p > 0; p /= 2) {
+    std::size_t phase = 0;
+    std::size_t distance = p;
+    for (std::size_t q = top;; q /= 2) {
+      for (std::size_t i = 0; i + distance < count; ++i) {
+        if ((i & p) == phase) use(i, i + distance);
+      }
+      if (q == p) break;
+      distance = q - p;
+      phase = p;
+    }
+  }
+}
 
 /// A network that brings the values of ranks `lowestRank` .. `highestRank` of `count` values, at
 /// most `kMostSorted`, to the places of these numbers; the other places end up with anything. The

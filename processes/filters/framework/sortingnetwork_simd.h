@@ -12,7 +12,9 @@
 
 #include <hwy/highway.h>
 
+#include <array>
 #include <cstddef>
+#include <utility>
 #include <vector>
 
 #include "processes/filters/framework/sortingnetwork.h"
@@ -21,6 +23,40 @@ HWY_BEFORE_NAMESPACE();
 namespace zarn::processes::filters::HWY_NAMESPACE {
 
 namespace hn = hwy::HWY_NAMESPACE;
+
+/// The steps of a network that sorts `kCount` values, known when the code is compiled.
+template <std::size_t kCount>
+inline constexpr auto kSortingSteps = [] {
+  constexpr std::size_t kSteps = [] {
+    std::size_t steps = 0;
+    ForEachSortingStep(kCount, [&](std::size_t, std::size_t) { ++steps; });
+    return steps;
+  }();
+  std::array<std::pair<std::size_t, std::size_t>, kSteps> steps{};
+  std::size_t next = 0;
+  ForEachSortingStep(kCount, [&](std::size_t first, std::size_t second) {
+    steps[next++] = {first, second};
+  });
+  return steps;
+}();
+
+template <class V>
+HWY_INLINE void SortPair(V& first, V& second) {
+  const V low = hn::Min(first, second);
+  second = hn::Max(first, second);
+  first = low;
+}
+template <std::size_t kCount, class V, std::size_t... kStep>
+HWY_INLINE void SortVectors(V* v, std::index_sequence<kStep...>) {
+  (SortPair(v[kSortingSteps<kCount>[kStep].first], v[kSortingSteps<kCount>[kStep].second]), ...);
+}
+
+/// Sorts `kCount` vectors lane by lane. All of it is unrolled and inlined: steps whose results
+/// nobody looks at cost nothing.
+template <std::size_t kCount, class V>
+HWY_INLINE void SortVectors(V* v) {
+  SortVectors<kCount>(v, std::make_index_sequence<kSortingSteps<kCount>.size()>());
+}
 
 /// Runs a network on `kBlock` sets of unsigned keys at once: value i of all sets stands in the
 /// aligned row at `values` + i * kBlock, whole vectors long. A step costs little more than its

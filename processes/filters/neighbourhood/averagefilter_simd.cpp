@@ -21,6 +21,7 @@
 #if HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128
 #include "processes/filters/neighbourhood/averagemeans_simd.h"
 #include "processes/filters/neighbourhood/boxsums_simd.h"
+#include "processes/filters/neighbourhood/windowstrip_simd.h"
 #endif
 
 HWY_BEFORE_NAMESPACE();
@@ -39,7 +40,11 @@ class Strip {
   /// The strip covers output columns `firstColumn` .. + plan.strip - 1.
   Strip(const AverageJob<T>& job, const AveragePlan& plan, const AverageScratch<T>& scratch,
         const BoundPattern<T>& bounds, std::ptrdiff_t firstColumn)
-      : job_(job), plan_(plan), scratch_(scratch), bounds_(bounds), firstColumn_(firstColumn) {
+      : job_(job),
+        plan_(plan),
+        scratch_(scratch),
+        bounds_(bounds),
+        strip_(job, scratch.strip, firstColumn, plan.strip) {
     for (std::size_t slot = 0; slot <= plan.taps; ++slot) scratch_.ring[slot].dirty = false;
   }
 
@@ -70,43 +75,17 @@ class Strip {
     return reinterpret_cast<U*>(row);
   }
 
-  // `count` elements at `from`, of a plane that ends at `end`, where the kernels may read on into
-  // the padding: in place, or else in `copy`.
-  template <typename U>
-  static const U* Padded(const U* from, std::size_t count, const U* end, U* copy) {
-    if (end - from >= static_cast<std::ptrdiff_t>(count + kRowPadding)) return from;
-    std::memcpy(copy, from, count * sizeof(U));
-    return copy;
-  }
-  const T* InputRow(std::ptrdiff_t x, std::ptrdiff_t y, std::size_t pixels, T* copy) const {
-    const BlockView<const T>& input = job_.input;
-    return Padded(input.Pixel(x, y), pixels * plan_.channels,
-                  input.Pixel(-input.MarginX(), input.Height() + input.MarginY()), copy);
-  }
-  // Null when there is no mask.
-  const std::uint8_t* MaskRow(std::ptrdiff_t x, std::ptrdiff_t y, std::size_t pixels) const {
-    if (job_.rules.mask() == nullptr) return nullptr;
-    const BlockView<const std::uint8_t>& mask = job_.mask;
-    return Padded(mask.Pixel(x, y), pixels,
-                  mask.Pixel(-mask.MarginX(), mask.Height() + mask.MarginY()), scratch_.bytes);
-  }
-
   // Moves the window down by one row. A row with excluded pixels is copied with these made neutral.
   HWY_ATTR void Enter(std::ptrdiff_t y) {
     WindowRow<T>& row = scratch_.ring[oldest_];
     oldest_ = oldest_ == plan_.taps ? 0 : oldest_ + 1;
     const std::size_t pixels = plan_.Pixels();
-    const std::ptrdiff_t x = firstColumn_ - job_.half;
-    const T* const input = InputRow(x, y, pixels, row.ownSamples);
-    const WindowRules<T>& rules = job_.rules;
-    const ExclusionTests<T> tests{
-        rules.HasInputNoData() ? rules.inputNoData().data() : nullptr,
-        rules.HasBackground() ? rules.background().data() : nullptr,
-        MaskRow(x, y, pixels),
-    };
+    const T* const input = strip_.WindowRow(y, row.ownSamples);
+    const ExclusionTests<T> tests = strip_.Tests(y);
     row.dirty = tests.Any() && AnyExcluded(input, pixels, plan_.channels, tests);
     if (row.dirty) {
-      CopyUnexcluded(input, pixels, plan_.channels, tests, row.ownSamples, row.ownFlags);
+      CopyUnexcluded(input, pixels, plan_.channels, tests, kNeutralSample<T>, row.ownSamples,
+                     row.ownFlags);
     }
     row.samples = row.dirty ? row.ownSamples : input;
     row.flags = row.dirty ? row.ownFlags : scratch_.clean;
@@ -149,7 +128,7 @@ class Strip {
 
   // Writes output row y.
   HWY_ATTR void AverageRow(std::ptrdiff_t y) {
-    T* const out = job_.output.Pixel(firstColumn_, y);
+    T* const out = strip_.Output(y);
     const UniformBounds<T> uniform(bounds_);
     const bool direct = !Centre().dirty && (uniform.active || !bounds_.active);
     const MeanRow<T> row(direct ? out : scratch_.means, scratch_.means, plan_.Outputs(), uniform);
@@ -166,10 +145,9 @@ class Strip {
     if (bounds_.active && !uniform.active) BoundMeans(bounds_, plan_.Outputs(), scratch_.means);
     if (!Centre().dirty) {
       std::memcpy(out, scratch_.means, plan_.Outputs() * sizeof(T));
-    } else if (!WithPixelVectors(plan_.channels, [&](auto constant) HWY_ATTR {
-                 MergeVectors<constant()>(y, out);
-               })) {
-      MergeRuns(y, out);
+    } else {
+      const std::uint8_t* const flags = Centre().flags + job_.half;
+      strip_.Merge(y, scratch_.means, [&](std::size_t x) { return flags[x] != 0; });
     }
   }
 
@@ -192,70 +170,11 @@ class Strip {
     return counts;
   }
 
-  // Chooses between mean, no-data, background and the old value, a vector of pixels at a time.
-  template <std::size_t kChannels>
-  HWY_ATTR void MergeVectors(std::ptrdiff_t y, T* out) {
-    using D = hn::ScalableTag<T>;
-    using Vectors = PixelVectors<D, kChannels>;
-    const D d;
-    const WindowRules<T>& rules = job_.rules;
-    const std::size_t width = plan_.strip;
-    const std::uint8_t* const mask = MaskRow(firstColumn_, y, width);
-    const T* const pixels = InputRow(firstColumn_, y, width, scratch_.centre);
-    const T* const background = rules.HasBackground() ? rules.background().data() : nullptr;
-    const T* const noData = rules.HasInputNoData() ? rules.inputNoData().data() : nullptr;
-    const T* const written = rules.HasOutputNoData() ? rules.outputNoData().data() : nullptr;
-    T* const means = scratch_.means;
-    // Merges the vector of pixels from x on; `old` and `to` are what the output holds there and
-    // where the result goes.
-    const auto merge = [&](std::size_t x, const T* old, T* to) HWY_ATTR {
-      const Vectors pixel(d, pixels + x * kChannels);
-      Vectors v(d, means + x * kChannels);
-      if (background != nullptr) v.Replace(pixel.Equal(background), background);
-      if (noData != nullptr) {
-        const auto isNoData = pixel.Equal(noData);
-        written != nullptr ? v.Replace(isNoData, written) : v.Replace(isNoData, Vectors(d, old));
-      }
-      if (mask != nullptr) {
-        v.Replace(hn::Not(LoadFlags(d, mask + x)), Vectors(d, old));
-      }
-      v.Store(to);
-    };
-    const std::size_t whole = width - width % hn::Lanes(d);
-    for (std::size_t x = 0; x < whole; x += hn::Lanes(d)) {
-      T* const to = out + x * kChannels;
-      merge(x, to, to);
-    }
-    // The last vector would pass the end of the row.
-    const std::size_t rest = (width - whole) * kChannels;
-    std::memcpy(scratch_.old, out + whole * kChannels, rest * sizeof(T));
-    merge(whole, scratch_.old, means + whole * kChannels);
-    std::memcpy(out + whole * kChannels, means + whole * kChannels, rest * sizeof(T));
-  }
-
-  // Copies runs of computed pixels, and decides excluded ones one by one.
-  HWY_ATTR void MergeRuns(std::ptrdiff_t y, T* out) {
-    const std::size_t channels = plan_.channels;
-    const std::size_t width = plan_.strip;
-    const std::uint8_t* const flags = Centre().flags + job_.half;
-    const T* const means = scratch_.means;
-    for (std::size_t x = 0; x < width;) {
-      const auto* const next =
-          static_cast<const std::uint8_t*>(std::memchr(flags + x, 1, width - x));
-      const std::size_t runEnd = next == nullptr ? width : static_cast<std::size_t>(next - flags);
-      std::memcpy(out + x * channels, means + x * channels, (runEnd - x) * channels * sizeof(T));
-      for (x = runEnd; x < width && flags[x] != 0; ++x) {
-        const Exclusion reason = job_.Classify(firstColumn_ + static_cast<std::ptrdiff_t>(x), y);
-        job_.rules.WriteExcluded(reason, out + x * channels);
-      }
-    }
-  }
-
   const AverageJob<T>& job_;
   const AveragePlan& plan_;
   const AverageScratch<T>& scratch_;
   const BoundPattern<T>& bounds_;
-  const std::ptrdiff_t firstColumn_;
+  const WindowStrip<T> strip_;
   std::size_t oldest_ = 0;        // slot of the row that has just left the window
   std::ptrdiff_t dirtyRows_ = 0;  // of the window
   bool columnsReady_ = false;     // the column sums hold the window's rows

@@ -9,17 +9,12 @@
 
 #include "processes/filters/neighbourhood/averagerows.h"
 #include "processes/filters/neighbourhood/boxrows.h"
+#include "processes/filters/neighbourhood/windowscratch.h"
 
 namespace zarn::processes::filters {
 
 /// What the vector kernels add up in: the narrowest type that holds every sum of a window exactly.
 enum class SumType { kUInt16, kInt32, kDouble };
-
-/// What counts the pixels of a window beside sums of type `Acc`.
-template <typename Acc>
-using CountFor = std::conditional_t<
-    std::is_same_v<Acc, std::uint16_t>, std::uint8_t,
-    std::conditional_t<std::is_same_v<Acc, std::int32_t>, std::uint16_t, std::uint32_t>>;
 
 /// Rounded division of 16-bit sums by a constant, as a multiplication:
 /// (sum + bias) * multiplier >> (16 + shift). An odd divisor leaves no ties.
@@ -119,60 +114,47 @@ struct AverageScratch {
   std::byte* levels;  ///< rows of shared sums
   std::byte* counts;
   T* means;
-  T* centre;
-  T* old;
   T* bounds;
-  std::uint8_t* bytes;
+  StripScratch<T> strip;
 
   static std::size_t Bytes(const AveragePlan& plan) {
-    std::size_t size = 0;
-    Layout(plan, nullptr, size);
-    return size;
+    ScratchCutter cutter(nullptr);
+    Layout(plan, nullptr, cutter);
+    return cutter.Size();
   }
   static AverageScratch Take(const AveragePlan& plan, std::byte* memory) {
-    std::size_t size = 0;
-    AverageScratch scratch = Layout(plan, memory, size);
+    ScratchCutter cutter(memory);
+    AverageScratch scratch = Layout(plan, memory, cutter);
     std::fill_n(scratch.clean, plan.Pixels() + kRowPadding, std::uint8_t{0});
     return scratch;
   }
 
  private:
-  static constexpr std::size_t kAlignment = 64;
-
-  static AverageScratch Layout(const AveragePlan& plan, std::byte* memory, std::size_t& size) {
-    const auto take = [&](std::size_t bytes) {
-      std::byte* const place = memory == nullptr ? nullptr : memory + size;
-      size += (bytes + kAlignment - 1) / kAlignment * kAlignment;
-      return place;
+  static AverageScratch Layout(const AveragePlan& plan, const std::byte* memory,
+                               ScratchCutter& cutter) {
+    using Widest = double;
+    const auto widestRow = [&](std::size_t elements) {
+      return reinterpret_cast<std::byte*>(cutter.Row<Widest>(elements));
     };
-    const auto row = [&](std::size_t elements, std::size_t elementSize) {
-      return take((elements + kRowPadding) * elementSize);
-    };
-    const auto samples = [&](std::size_t elements) {
-      return reinterpret_cast<T*>(row(elements, sizeof(T)));
-    };
-    const auto flags = [&] { return reinterpret_cast<std::uint8_t*>(row(plan.Pixels(), 1)); };
-    constexpr std::size_t kWidest = sizeof(double);
+    const auto flags = [&] { return cutter.Row<std::uint8_t>(plan.Pixels()); };
     AverageScratch s{};
     const std::size_t slots = plan.taps + 1;
-    s.ring = reinterpret_cast<WindowRow<T>*>(take(slots * sizeof(WindowRow<T>)));
+    s.ring = reinterpret_cast<WindowRow<T>*>(cutter.Take(slots * sizeof(WindowRow<T>)));
     for (std::size_t slot = 0; slot < slots; ++slot) {
-      T* const ownSamples = samples(plan.Samples());
+      T* const ownSamples = cutter.Row<T>(plan.Samples());
       std::uint8_t* const ownFlags = flags();
       if (memory != nullptr) s.ring[slot] = {ownSamples, ownFlags, ownSamples, ownFlags, {}, false};
     }
-    s.ordered = reinterpret_cast<const T**>(take(plan.taps * sizeof(T*)));
+    s.ordered = reinterpret_cast<const T**>(cutter.Take(plan.taps * sizeof(T*)));
     s.clean = flags();
-    s.columns = row(plan.Samples(), kWidest);
-    s.excludedColumns = row(plan.Pixels(), kWidest);
+    s.columns = widestRow(plan.Samples());
+    s.excludedColumns = widestRow(plan.Pixels());
     s.pitch = plan.Samples() + kRowPadding;
-    s.levels = take((SharedLevels(plan.taps) + 1) * s.pitch * kWidest);
-    s.counts = row(plan.Outputs(), kWidest);
-    s.means = samples(plan.Outputs());
-    s.centre = samples(plan.Outputs());
-    s.old = samples(plan.Outputs());
-    s.bounds = samples(4 * (plan.channels + kRowPadding));
-    s.bytes = flags();
+    s.levels = cutter.Take((SharedLevels(plan.taps) + 1) * s.pitch * sizeof(Widest));
+    s.counts = widestRow(plan.Outputs());
+    s.means = cutter.Row<T>(plan.Outputs());
+    s.bounds = cutter.Row<T>(4 * (plan.channels + kRowPadding));
+    s.strip = StripScratch<T>::Cut(cutter, plan.Outputs(), plan.Pixels());
     return s;
   }
 };

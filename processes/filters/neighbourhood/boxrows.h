@@ -66,6 +66,12 @@ struct RowRange {
     return high < low || (top - low <= 53 && top < 1024);
   }
 
+  /// The same for the squares of the samples; those too small for their digits do not count as
+  /// finite.
+  RowRange OfSquares() const {
+    return {2 * low, 2 * high + 1, finite && (high < low || 2 * low >= -1074)};
+  }
+
   static RowRange OfIntegers(int bits) { return {0, bits - 1, true}; }
 
   /// From the bit patterns of the least magnitude above zero (0 when there is none) and the
@@ -77,6 +83,12 @@ struct RowRange {
     return {lowExponent - 150, highExponent - 127, highExponent != 0xFF};
   }
 };
+
+/// What counts the pixels of a window beside sums of type `Acc`.
+template <typename Acc>
+using CountFor = std::conditional_t<
+    std::is_same_v<Acc, std::uint16_t>, std::uint8_t,
+    std::conditional_t<std::is_same_v<Acc, std::int32_t>, std::uint16_t, std::uint32_t>>;
 
 /// One input row of a window: the input itself where that is possible, else a padded copy.
 template <typename T>

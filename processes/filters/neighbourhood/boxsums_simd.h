@@ -138,14 +138,14 @@ HWY_ATTR bool AnyExcluded(const T* row, std::size_t pixels, std::size_t channels
   return any;
 }
 
-/// Copies a row with the samples of excluded pixels made neutral, and flags these pixels;
-/// `kChannels` is 1 or 3.
+/// Copies a row with the samples of excluded pixels made neutral, and flags these pixels.
 template <std::size_t kChannels, typename T>
 HWY_ATTR void CopyVectorsUnexcluded(const T* row, std::size_t pixels,
-                                    const ExclusionTests<T>& tests, T* to, std::uint8_t* flags) {
+                                    const ExclusionTests<T>& tests, T neutralSample, T* to,
+                                    std::uint8_t* flags) {
   using D = hn::ScalableTag<T>;
   const D d;
-  const auto neutral = hn::Set(d, kNeutralSample<T>);
+  const auto neutral = hn::Set(d, neutralSample);
   for (std::size_t i = 0; i < pixels; i += hn::Lanes(d)) {
     PixelVectors<D, kChannels> v(d, row + i * kChannels);
     const auto excluded = tests.ExcludesVector(d, v, i);
@@ -155,19 +155,19 @@ HWY_ATTR void CopyVectorsUnexcluded(const T* row, std::size_t pixels,
   }
 }
 
-/// Copies a row, perhaps onto itself, with the samples of excluded pixels made neutral, and flags
+/// Copies a row, perhaps onto itself, with the samples of excluded pixels made `neutral`, and flags
 /// these pixels.
 template <typename T>
 HWY_ATTR void CopyUnexcluded(const T* row, std::size_t pixels, std::size_t channels,
-                             ExclusionTests<T> tests, T* to, std::uint8_t* flags) {
+                             ExclusionTests<T> tests, T neutral, T* to, std::uint8_t* flags) {
   const bool vectors = WithPixelVectors(channels, [&](auto constant) HWY_ATTR {
-    CopyVectorsUnexcluded<constant()>(row, pixels, tests, to, flags);
+    CopyVectorsUnexcluded<constant()>(row, pixels, tests, neutral, to, flags);
   });
   for (std::size_t i = 0; !vectors && i < pixels; ++i) {
     const bool excluded = tests.Excludes(row, channels, i);
     flags[i] = excluded ? 1 : 0;
     for (std::size_t c = i * channels; c < (i + 1) * channels; ++c) {
-      to[c] = excluded ? kNeutralSample<T> : row[c];
+      to[c] = excluded ? neutral : row[c];
     }
   }
 }

@@ -11,18 +11,19 @@
 #include <vector>
 
 #include "processes/filters/neighbourhood/averagescratch.h"
-#include "tests/support/averagefiltering.h"
 #include "tests/support/randomnumbers.h"
+#include "tests/support/windowfiltering.h"
 
 namespace zarn::processes::filters {
 namespace {
 
 using testsupport::AgreesWithReference;
-using testsupport::AverageParameters;
-using testsupport::FilterAverage;
+using testsupport::FilterWindows;
 using testsupport::RandomNumbers;
 using testsupport::Shape;
 using testsupport::TestBlock;
+using testsupport::TestedAverage;
+using testsupport::WindowParameters;
 
 template <typename T>
 class AverageKernelsTest : public ::testing::Test {
@@ -79,7 +80,7 @@ TYPED_TEST_SUITE(AverageKernelsTest, testsupport::HandledTypes, testsupport::Typ
 
 TYPED_TEST(AverageKernelsTest, AgreesWithTheReferenceOnRandomScenes) {
   for (std::uint64_t seed = 0; seed < 2500; ++seed) {
-    ASSERT_TRUE(testsupport::AgreesOnScene<TypeParam>(seed));
+    ASSERT_TRUE((testsupport::AgreesOnScene<TestedAverage, TypeParam>(seed)));
   }
 }
 
@@ -103,8 +104,8 @@ TYPED_TEST(AverageKernelsTest, AgreesOnLongRows) {
           // The output has margins beside its rows that must stay as they are.
           const TestBlock<TypeParam> output(
               {.width = width, .height = 2, .channels = channels, .marginX = 3, .marginY = 1});
-          const AverageParameters parameters{.kernelSize = kernelSize, .background = 11};
-          ASSERT_TRUE(AgreesWithReference(parameters, input, {}, output));
+          const WindowParameters parameters{.kernelSize = kernelSize, .background = 11};
+          ASSERT_TRUE(AgreesWithReference<TestedAverage>(parameters, input, {}, output));
         }
       }
     }
@@ -132,7 +133,7 @@ TYPED_TEST(AverageKernelsTest, HoldsTheSumsAndCountsOfLargeWindows) {
         if (pattern == 2) {
           for (std::size_t i = 0; i < input.SampleCount(); i += 2) input.Samples()[i] = kHigh;
         }
-        AverageParameters parameters{.kernelSize = kernelSize};
+        WindowParameters parameters{.kernelSize = kernelSize};
         if (pattern >= 4) parameters.background = 3;
         if (pattern == 4) {
           for (std::size_t i = 0; i < input.SampleCount() / channels; i += 1 + i % 11) {
@@ -146,7 +147,7 @@ TYPED_TEST(AverageKernelsTest, HoldsTheSumsAndCountsOfLargeWindows) {
             input.At(x, 0) = static_cast<TypeParam>(100 + x);
           }
         }
-        ASSERT_TRUE(AgreesWithReference(parameters, input, {}, output));
+        ASSERT_TRUE(AgreesWithReference<TestedAverage>(parameters, input, {}, output));
       }
     }
   }
@@ -191,7 +192,8 @@ TYPED_TEST(AverageKernelsTest, RoundsMeansNearTiesExactly) {
             static_cast<double>(std::numeric_limits<TypeParam>::max()), std::nullopt));
       }
       TestBlock<TypeParam> output({.width = shape.width, .height = 1});
-      ASSERT_TRUE(FilterAverage({.kernelSize = kernelSize}, input, mask, output).Ok());
+      ASSERT_TRUE(
+          FilterWindows<TestedAverage>({.kernelSize = kernelSize}, input, mask, output).Ok());
       for (std::int64_t w = 0; w < kWindows; ++w) {
         ASSERT_EQ(output.At(w * kernelSize + half, 0), expected[static_cast<std::size_t>(w)])
             << "kernel " << kernelSize << (masked ? ", masked" : "") << ", window " << w;

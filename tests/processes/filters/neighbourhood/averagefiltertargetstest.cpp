@@ -5,16 +5,17 @@
 #include <cstdint>
 #include <string>
 
-#include "tests/support/averagefiltering.h"
+#include "tests/support/windowfiltering.h"
 
 namespace zarn::processes::filters {
 namespace {
 
 using testsupport::AgreesOnScene;
 using testsupport::AgreesWithReference;
-using testsupport::AverageParameters;
 using testsupport::Shape;
 using testsupport::TestBlock;
+using testsupport::TestedAverage;
+using testsupport::WindowParameters;
 
 /// Runs the kernels of one vector target, whatever the CPU would choose.
 class AverageTargetsTest : public ::testing::TestWithParam<std::int64_t> {
@@ -25,7 +26,7 @@ class AverageTargetsTest : public ::testing::TestWithParam<std::int64_t> {
   template <typename T>
   static void CompareScenes() {
     for (std::uint64_t seed = 50000; seed < 50600; ++seed) {
-      ASSERT_TRUE(AgreesOnScene<T>(seed));
+      ASSERT_TRUE((AgreesOnScene<TestedAverage, T>(seed)));
     }
   }
 
@@ -39,11 +40,12 @@ class AverageTargetsTest : public ::testing::TestWithParam<std::int64_t> {
       const TestBlock<T> input(shape);
       const TestBlock<T> output({.width = width, .height = 2, .channels = channels});
       for (const double noData : {-1.0, 41.0}) {
-        const AverageParameters parameters{.kernelSize = 5,
-                                           .background = 73 + noData,
-                                           .inputNoData = std::vector<double>(channels, noData),
-                                           .outputNoData = std::vector<double>(channels, 56)};
-        ASSERT_TRUE(AgreesWithReference(parameters, input, {}, output)) << width << " wide";
+        const WindowParameters parameters{.kernelSize = 5,
+                                          .background = 73 + noData,
+                                          .inputNoData = std::vector<double>(channels, noData),
+                                          .outputNoData = std::vector<double>(channels, 56)};
+        ASSERT_TRUE(AgreesWithReference<TestedAverage>(parameters, input, {}, output))
+            << width << " wide";
       }
     }
   }

@@ -5,21 +5,18 @@
 #include <cmath>
 #include <cstdint>
 #include <limits>
-#include <memory>
-#include <numeric>
-#include <string>
 #include <vector>
 
-#include "host/core/exception.h"
-#include "tests/support/averagefiltering.h"
+#include "tests/support/windowfiltering.h"
 
 namespace zarn::processes::filters {
 namespace {
 
-using testsupport::AverageParameters;
-using testsupport::FilterAverage;
+using testsupport::FilterWindows;
 using testsupport::Shape;
 using testsupport::TestBlock;
+using testsupport::TestedAverage;
+using testsupport::WindowParameters;
 
 constexpr Shape kOnePixel{.width = 1, .height = 1};
 constexpr Shape kOnePixelWithMargins{.width = 1, .height = 1, .marginX = 1, .marginY = 1};
@@ -27,14 +24,14 @@ constexpr Shape kOnePixelWithMargins{.width = 1, .height = 1, .marginX = 1, .mar
 // A pixel and its eight neighbours, row by row, filtered with a window of 3x3; `before` is what the
 // output holds.
 template <typename T>
-T FilterNine(AverageParameters parameters, const std::array<T, 9>& samples,
+T FilterNine(WindowParameters parameters, const std::array<T, 9>& samples,
              const std::vector<std::uint8_t>& mask = {}, T before = 77) {
   TestBlock<T> input(kOnePixelWithMargins);
   std::copy(samples.begin(), samples.end(), input.Samples());
   TestBlock<T> output(kOnePixel);
   output.Fill(before);
   parameters.kernelSize = 3;
-  const FilterResult result = FilterAverage(parameters, input, mask, output);
+  const FilterResult result = FilterWindows<TestedAverage>(parameters, input, mask, output);
   EXPECT_EQ(result.code, 1);
   EXPECT_EQ(result.message, "");
   return output.At(0, 0);
@@ -61,14 +58,14 @@ TEST(AverageFilter, CopiesBackgroundPixels) {
 }
 
 TEST(AverageFilter, ReplacesNoDataPixelsAndKeepsTheirValueOutOfMeans) {
-  const AverageParameters replaced{.inputNoData = {255}, .outputNoData = {0}};
+  const WindowParameters replaced{.inputNoData = {255}, .outputNoData = {0}};
   EXPECT_EQ(FilterNine<std::uint8_t>(replaced, {9, 9, 9, 9, 255, 9, 9, 9, 9}), 0);
   EXPECT_EQ(FilterNine<std::uint8_t>(replaced, {0, 0, 0, 1, 0, 1, 1, 255, 255}), 1);  // 3 / 7
   EXPECT_EQ(FilterNine<std::uint8_t>(replaced, {0, 0, 0, 2, 0, 0, 0, 0, 0}), 1);      // 2 / 9
-  const AverageParameters kept{.inputNoData = {255}};
+  const WindowParameters kept{.inputNoData = {255}};
   EXPECT_EQ(FilterNine<std::uint8_t>(kept, {9, 9, 9, 9, 255, 9, 9, 9, 9}), 77);
   // The entry is rounded for the pixel that is written, cut off for the value that is avoided.
-  const AverageParameters half{.inputNoData = {254.5}, .outputNoData = {10.5}};
+  const WindowParameters half{.inputNoData = {254.5}, .outputNoData = {10.5}};
   EXPECT_EQ(FilterNine<std::uint8_t>(half, {9, 9, 9, 9, 255, 9, 9, 9, 9}), 11);
   EXPECT_EQ(FilterNine<std::uint8_t>(half, {10, 10, 10, 10, 10, 10, 10, 10, 10}), 11);
   EXPECT_EQ(FilterNine<std::uint8_t>(half, {11, 11, 11, 11, 11, 11, 11, 11, 11}), 11);
@@ -90,7 +87,7 @@ TEST(AverageFilter, SkipsMaskedPixelsAndLeavesThemUnwritten) {
   EXPECT_EQ(FilterNine({}, samples, {1, 1, 1, 1, 0, 1, 1, 1, 1}), 77);
   EXPECT_EQ(FilterNine({}, samples, {0, 0, 0, 0, 128, 0, 0, 0, 0}), 10);
   // The mask comes first: neither no-data nor background is written.
-  const AverageParameters both{.background = 20, .inputNoData = {10}, .outputNoData = {3}};
+  const WindowParameters both{.background = 20, .inputNoData = {10}, .outputNoData = {3}};
   EXPECT_EQ(FilterNine(both, samples, {1, 1, 1, 1, 0, 1, 1, 1, 1}), 77);
 }
 
@@ -106,9 +103,9 @@ TEST(AverageFilter, ExcludesWholePixelsOnly) {
   const std::array<std::uint8_t, 3> almost = {1, 2, 4};
   std::copy(excluded.begin(), excluded.end(), input.Pixel(-1, -1));
   std::copy(almost.begin(), almost.end(), input.Pixel(1, 1));
-  ASSERT_TRUE(
-      FilterAverage({.inputNoData = {1, 2, 3}, .outputNoData = {9, 18, 0}}, input, {}, output)
-          .Ok());
+  ASSERT_TRUE(FilterWindows<TestedAverage>({.inputNoData = {1, 2, 3}, .outputNoData = {9, 18, 0}},
+                                           input, {}, output)
+                  .Ok());
   EXPECT_EQ(output.At(0, 0, 0), 10);  // (7 * 10 + 1) / 8 = 8.9 rounds to 9, which is avoided
   EXPECT_EQ(output.At(0, 0, 1), 19);  // (7 * 20 + 2) / 8 = 17.75 rounds to 18
   EXPECT_EQ(output.At(0, 0, 2), 36);  // (7 * 40 + 4) / 8 = 35.5
@@ -162,152 +159,12 @@ TEST(AverageFilter, AcceptsEmptyBlocks) {
     TestBlock<std::uint8_t> output(shape);
     const TestBlock<std::uint8_t> before = output;
     // A pixel without channels equals any no-data pixel.
-    const AverageParameters parameters{.background = 0, .inputNoData = {7}, .outputNoData = {8}};
+    const WindowParameters parameters{.background = 0, .inputNoData = {7}, .outputNoData = {8}};
     const std::vector<std::uint8_t> mask(
         static_cast<std::size_t>(shape.FullWidth() * shape.FullHeight()), 0);
-    EXPECT_EQ(FilterAverage(parameters, input, {}, output).message, "");
-    EXPECT_EQ(FilterAverage(parameters, input, mask, output).message, "");
+    EXPECT_EQ(FilterWindows<TestedAverage>(parameters, input, {}, output).message, "");
+    EXPECT_EQ(FilterWindows<TestedAverage>(parameters, input, mask, output).message, "");
     EXPECT_TRUE(SameBlocks(output, before));
-  }
-}
-
-// Failures.
-
-using gobs::NativeDataTypeCode;
-using gobs::Raster;
-using gobs::RasterInfo;
-
-const char* const kUnknownType = "Unknown raster block data type for average filter.";
-const char* const kSizes = "Input and output rasters must be the same size (excluding margins).";
-const char* const kMargins = "Raster Margins are too small.";
-const char* const kTypes =
-    "Input and output rasters must have the same data type and number of channels.";
-const char* const kLists = "Fewer no-data values than channels.";
-const char* const kInconsistent = "Raster block has no data or an inconsistent size.";
-const char* const kOverlapping = "Input and output rasters overlap.";
-
-struct Failure {
-  const char* what;
-  const char* message;
-  // Each of these describes a sound call unless a case says otherwise.
-  std::uint32_t inputCode = 2;
-  std::uint32_t outputCode = 2;
-  std::uint32_t inputWidth = 8;
-  std::uint32_t inputHeight = 6;
-  std::uint32_t outputChannels = 2;
-  std::uint32_t marginX = 1;
-  std::uint32_t marginY = 1;
-  int kernelSize = 3;
-  std::size_t noDataValues = 2;
-  std::size_t inputMissingBytes = 0;
-  std::size_t outputMissingBytes = 0;
-  bool inputNull = false;
-  bool outputNull = false;
-  std::size_t outputOffset = 4096;
-};
-
-constexpr std::size_t kMemory = 8192;
-
-FilterResult FilterWith(const Failure& f, std::vector<std::uint8_t>& memory) {
-  const RasterInfo inputInfo(f.inputWidth, f.inputHeight, 2,
-                             static_cast<NativeDataTypeCode>(f.inputCode),
-                             {.marginX = f.marginX, .marginY = f.marginY});
-  const RasterInfo outputInfo(8, 6, f.outputChannels,
-                              static_cast<NativeDataTypeCode>(f.outputCode));
-  const Raster input(inputInfo, f.inputNull ? nullptr : memory.data(),
-                     inputInfo.DescribedSize() - f.inputMissingBytes);
-  Raster output(outputInfo, f.outputNull ? nullptr : memory.data() + f.outputOffset,
-                outputInfo.DescribedSize() - f.outputMissingBytes);
-  const std::vector<double> noData(f.noDataValues, 3);
-  return testsupport::MakeAverageFilter(
-             {.kernelSize = f.kernelSize, .inputNoData = noData, .outputNoData = noData})
-      ->Process(input, output, 0, 0, nullptr);
-}
-
-TEST(AverageFilterFailure, ReportsTheFirstFaultAndTouchesNothing) {
-  const Failure kFailures[] = {
-      {.what = "signed 64 bits", .message = kUnknownType, .inputCode = 7, .outputCode = 7},
-      {.what = "unsigned 64 bits", .message = kUnknownType, .inputCode = 8, .outputCode = 8},
-      {.what = "complex short", .message = kUnknownType, .inputCode = 11, .outputCode = 11},
-      {.what = "complex double", .message = kUnknownType, .inputCode = 14, .outputCode = 14},
-      {.what = "type before size",
-       .message = kUnknownType,
-       .inputCode = 7,
-       .inputWidth = 9,
-       .marginX = 0},
-      {.what = "narrower input", .message = kSizes, .inputWidth = 7},
-      {.what = "wider input", .message = kSizes, .inputWidth = 9},
-      {.what = "lower input", .message = kSizes, .inputHeight = 5},
-      {.what = "size before margins", .message = kSizes, .inputWidth = 9, .kernelSize = 5},
-      {.what = "margins in x", .message = kMargins, .marginX = 0},
-      {.what = "margins in y", .message = kMargins, .marginY = 0},
-      {.what = "even kernel", .message = kMargins, .kernelSize = 4},
-      {.what = "negative kernel", .message = kMargins, .kernelSize = -2},
-      {.what = "smallest kernel",
-       .message = kMargins,
-       .kernelSize = std::numeric_limits<int>::min()},
-      {.what = "largest kernel",
-       .message = kMargins,
-       .kernelSize = std::numeric_limits<int>::max()},
-      {.what = "margins before types", .message = kMargins, .outputCode = 3, .kernelSize = 5},
-      {.what = "signedness", .message = kTypes, .outputCode = 3},
-      {.what = "sample size", .message = kTypes, .outputCode = 0},
-      {.what = "channels", .message = kTypes, .outputChannels = 3},
-      {.what = "types before lists", .message = kTypes, .outputCode = 6, .noDataValues = 1},
-      {.what = "short lists", .message = kLists, .noDataValues = 1},
-      {.what = "lists before data", .message = kLists, .noDataValues = 1, .inputNull = true},
-      {.what = "no input", .message = kInconsistent, .inputNull = true},
-      {.what = "no output", .message = kInconsistent, .outputNull = true},
-      {.what = "short input", .message = kInconsistent, .inputMissingBytes = 1},
-      {.what = "short output", .message = kInconsistent, .outputMissingBytes = 1},
-      {.what = "data before overlap",
-       .message = kInconsistent,
-       .inputMissingBytes = 1,
-       .outputOffset = 0},
-      {.what = "in place", .message = kOverlapping, .outputOffset = 0},
-      {.what = "last sample", .message = kOverlapping, .outputOffset = 10 * 8 * 2 * 2 - 2},
-  };
-  std::vector<std::uint8_t> memory(kMemory);
-  std::iota(memory.begin(), memory.end(), std::uint8_t{1});
-  const std::vector<std::uint8_t> before = memory;
-  for (const Failure& failure : kFailures) {
-    SCOPED_TRACE(failure.what);
-    const FilterResult result = FilterWith(failure, memory);
-    EXPECT_EQ(result.code, 0);
-    EXPECT_EQ(result.message, failure.message);
-    EXPECT_EQ(memory, before);
-  }
-}
-
-TEST(AverageFilterFailure, AcceptsTheCallsBesideTheFailures) {
-  const Failure kSound[] = {
-      {.what = "as it is", .message = ""},
-      {.what = "taller input", .message = "", .inputHeight = 7},
-      {.what = "longer lists", .message = "", .noDataValues = 3},
-      {.what = "no lists", .message = "", .noDataValues = 0},
-      {.what = "side by side", .message = "", .outputOffset = 10 * 8 * 2 * 2},
-  };
-  for (const Failure& sound : kSound) {
-    SCOPED_TRACE(sound.what);
-    std::vector<std::uint8_t> memory(kMemory, 7);
-    const FilterResult result = FilterWith(sound, memory);
-    EXPECT_EQ(result.code, 1);
-    EXPECT_EQ(result.message, "");
-  }
-}
-
-TEST(AverageFilterFailure, BlocksWithoutATypeEndInTheExceptionOfTheLimits) {
-  // No code has these descriptions; the sizes differ, too, but the limits come first.
-  for (const gobs::DataType type : {gobs::DataType{}, gobs::DataType{12, 0, 0, 12, 0, 0}}) {
-    const Raster input(RasterInfo(4, 4, 1, type));
-    Raster output(RasterInfo(5, 5, 1, NativeDataTypeCode::kUInt8));
-    try {
-      testsupport::MakeAverageFilter({})->Process(input, output, 0, 0, nullptr);
-      ADD_FAILURE() << "nothing thrown";
-    } catch (const ParameterException& e) {
-      EXPECT_EQ(e.Message(), "Cannot evaluate MinValue() for the provided datatype");
-      EXPECT_EQ(e.ParameterName(), "eDataType");
-    }
   }
 }
 

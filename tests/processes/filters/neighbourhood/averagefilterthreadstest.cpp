@@ -8,12 +8,13 @@
 #include <vector>
 
 #include "processes/filters/framework/parallel.h"
-#include "tests/support/averagefiltering.h"
+#include "tests/support/windowfiltering.h"
 
 namespace zarn::processes::filters {
 namespace {
 
 using testsupport::AgreesOnScene;
+using testsupport::TestedAverage;
 
 // Threads that a parallel region opened here gets.
 int TeamSize() {
@@ -43,9 +44,9 @@ TEST_F(AverageFilterThreadsTest, GivesTheSameBitsForEveryThreadCount) {
     omp_set_num_threads(threads);
     ASSERT_EQ(TeamSize(), threads);
     for (std::uint64_t seed = 10000; seed < 10150; ++seed) {
-      EXPECT_TRUE(AgreesOnScene<std::uint8_t>(seed));
-      EXPECT_TRUE(AgreesOnScene<std::int16_t>(seed));
-      EXPECT_TRUE(AgreesOnScene<float>(seed));
+      EXPECT_TRUE((AgreesOnScene<TestedAverage, std::uint8_t>(seed)));
+      EXPECT_TRUE((AgreesOnScene<TestedAverage, std::int16_t>(seed)));
+      EXPECT_TRUE((AgreesOnScene<TestedAverage, float>(seed)));
     }
     ASSERT_EQ(TeamSize(), threads);
   }
@@ -84,8 +85,8 @@ TEST_F(AverageFilterThreadsTest, RunsInsideAParallelRegion) {
       omp_set_num_threads(2);
       for (std::uint64_t i = 0; i < 40; ++i) {
         const std::uint64_t seed = 20000 + 2 * i + static_cast<std::uint64_t>(me);
-        EXPECT_TRUE(AgreesOnScene<std::uint8_t>(seed));
-        EXPECT_TRUE(AgreesOnScene<double>(seed));
+        EXPECT_TRUE((AgreesOnScene<TestedAverage, std::uint8_t>(seed)));
+        EXPECT_TRUE((AgreesOnScene<TestedAverage, double>(seed)));
       }
       inner[static_cast<std::size_t>(me)] = TeamSize();
     }
@@ -100,7 +101,7 @@ TEST_F(AverageFilterThreadsTest, RunsInThreadsOfTheHost) {
     hosts.emplace_back([host] {
       omp_set_num_threads(2);
       for (std::uint64_t i = 0; i < 40; ++i) {
-        EXPECT_TRUE(AgreesOnScene<std::uint16_t>(30000 + 3 * i + host));
+        EXPECT_TRUE((AgreesOnScene<TestedAverage, std::uint16_t>(30000 + 3 * i + host)));
       }
     });
   }

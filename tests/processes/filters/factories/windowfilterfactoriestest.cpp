@@ -7,6 +7,9 @@
 
 #include "host/nspio/debugger.h"
 #include "processes/filters/factories/averagefilterfactory.h"
+#include "processes/filters/factories/medianfilterfactory.h"
+#include "processes/filters/factories/noisefilterfactory.h"
+#include "processes/filters/factories/removeblobfactory.h"
 #include "tests/support/testblock.h"
 
 namespace zarn::processes::filters {
@@ -47,6 +50,33 @@ TEST(AverageFilterFactory, CopiesBothParameters) {
   EXPECT_EQ(Fingerprint(copy), "10");
   copy = marginsMissing;
   EXPECT_EQ(Fingerprint(copy), "Raster Margins are too small.");
+}
+
+// The results tell the kernel size and the background value apart, and the families.
+template <class Factory>
+void ExpectFingerprints(const std::string& pixelAlone, const std::string& zero,
+                        const std::string& thirty, const std::string& aloneWithThirty) {
+  const Factory small(1, 0);
+  const Factory withZero(3, 0);
+  const Factory withThirty(3, 30);
+  EXPECT_EQ(Fingerprint(small), pixelAlone);
+  EXPECT_EQ(Fingerprint(withZero), zero);
+  EXPECT_EQ(Fingerprint(withThirty), thirty);
+  EXPECT_EQ(Fingerprint(Factory(1, 30)), aloneWithThirty);
+  Factory copy(withThirty);
+  EXPECT_EQ(Fingerprint(copy), thirty);
+  copy = withZero;
+  EXPECT_EQ(Fingerprint(copy), zero);
+  copy = small;
+  EXPECT_EQ(Fingerprint(copy), pixelAlone);
+  EXPECT_EQ(Fingerprint(Factory(5, 0)), "Raster Margins are too small.");
+}
+
+TEST(WindowFilterFactories, HandTheirParametersOn) {
+  ExpectFingerprints<AverageFilterFactory>("8", "10", "8", "8");
+  ExpectFingerprints<MedianFilterFactory>("8", "8", "8", "8");
+  ExpectFingerprints<NoiseFilterFactory>("0", "8", "8", "30");
+  ExpectFingerprints<RemoveBlobFactory>("8", "0", "30", "8");
 }
 
 TEST(AverageFilterFactory, FiltersAreIndependentAndOutliveIt) {

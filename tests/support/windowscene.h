@@ -11,9 +11,9 @@
 #include <type_traits>
 #include <vector>
 
-#include "tests/support/averagereference.h"
 #include "tests/support/randomnumbers.h"
 #include "tests/support/testblock.h"
+#include "tests/support/windowreference.h"
 
 namespace zarn::testsupport {
 
@@ -49,19 +49,28 @@ enum class Holes {
   kPatches,  ///< rectangles and specks
 };
 
+/// What a filter accepts.
+struct SceneLimits {
+  std::vector<int> kernelSizes = {-1, 0, 1, 2, 3, 3,  3,  3,  4,  5,  5, 5,
+                                  6,  7, 7, 8, 9, 11, 13, 15, 16, 17, 31};
+  bool tallerInput = true;
+  bool needsBackground = false;
+};
+
 /// A block with parameters that suit it, drawn from one seed.
 template <typename T>
-class AverageScene {
+class WindowScene {
  public:
-  AverageParameters parameters;
+  WindowParameters parameters;
   Shape inputShape;
   Shape outputShape;
   TestBlock<T> input{Shape{}};
   std::vector<std::uint8_t> mask;
 
-  explicit AverageScene(std::uint64_t seed) : random_(seed * 1000003 + sizeof(T)), seed_(seed) {
-    ChooseShape();
-    ChooseParameters();
+  explicit WindowScene(std::uint64_t seed, const SceneLimits& limits = {})
+      : random_(seed * 1000003 + sizeof(T)), seed_(seed) {
+    ChooseShape(limits);
+    ChooseParameters(limits);
     input = TestBlock<T>(inputShape, random_.Below(4));
     values_ = random_.Pick(
         std::is_floating_point_v<T>
@@ -103,9 +112,8 @@ class AverageScene {
 
   std::ptrdiff_t Half() const { return parameters.kernelSize / 2; }
 
-  void ChooseShape() {
-    parameters.kernelSize = random_.Pick(std::vector<int>{-1, 0, 1, 2, 3, 3,  3,  3,  4,  5,  5, 5,
-                                                          6,  7, 7, 8, 9, 11, 13, 15, 16, 17, 31});
+  void ChooseShape(const SceneLimits& limits) {
+    parameters.kernelSize = random_.Pick(limits.kernelSizes);
     const bool large = parameters.kernelSize > 9;
     inputShape.width = random_.Between(1, 70);
     if (random_.Percent(40)) {
@@ -116,6 +124,7 @@ class AverageScene {
     outputShape.width = inputShape.width;
     outputShape.height = random_.Between(1, large ? 4 : 7);
     inputShape.height = outputShape.height + (random_.Percent(25) ? random_.Below(4) : 0);
+    if (!limits.tallerInput) inputShape.height = outputShape.height;
     inputShape.channels = random_.Pick(std::vector<std::uint32_t>{1, 1, 1, 1, 2, 3, 3, 3, 4, 5});
     outputShape.channels = inputShape.channels;
     const auto half = static_cast<std::uint32_t>(Half());
@@ -141,7 +150,7 @@ class AverageScene {
     }
   }
 
-  void ChooseParameters() {
+  void ChooseParameters(const SceneLimits& limits) {
     const auto list = [&] {
       // One value for all channels is the usual case; longer lists are allowed.
       std::vector<double> values(inputShape.channels + random_.Below(2), ChooseNoData());
@@ -150,7 +159,7 @@ class AverageScene {
       }
       return values;
     };
-    if (random_.Percent(60)) parameters.background = ChooseNoData();
+    if (random_.Percent(60) || limits.needsBackground) parameters.background = ChooseNoData();
     if (random_.Percent(60)) parameters.inputNoData = list();
     if (random_.Percent(50)) parameters.outputNoData = list();
     if (random_.Percent(40)) {
