@@ -35,6 +35,15 @@ std::vector<T> NoDataPixel(const std::vector<double>& values, std::size_t parts)
   return pixel;
 }
 
+// Other lists of bands are not read together: GDAL 3.6 confuses the strips of band-interleaved
+// GeoTIFFs then, when it decodes with several threads.
+bool AreLeadingBands(const std::vector<int>& bands) {
+  for (std::size_t i = 0; i < bands.size(); ++i) {
+    if (bands[i] != static_cast<int>(i) + 1) return false;
+  }
+  return true;
+}
+
 // The rules for one row of pixels; a NaN or an excluded pixel is one as a whole. Samples have one
 // part, or two where they are complex.
 template <typename T>
@@ -198,13 +207,27 @@ void BlockReader::ReadBands(const Fresh& fresh, const std::vector<int>& bands, P
   if (fresh.inside.height == 0) return;
   const int width = static_cast<int>(fresh.inside.width);
   const int height = static_cast<int>(fresh.inside.height);
+  const auto pixelBytes = static_cast<GSpacing>(plane.PixelBytes());
+  const auto stride = static_cast<GSpacing>(plane.Stride());
+  const auto sampleBytes = static_cast<GSpacing>(source_.Type().Bytes());
+  const GDALDataType type = source_.Type().gdal;
+  std::byte* const first = plane.At(fresh.column, fresh.row);
+  const auto x = static_cast<int>(fresh.inside.x);
+  const auto y = static_cast<int>(fresh.inside.y);
   CPLErrorReset();
-  const CPLErr result = source_.Dataset().RasterIO(
-      GF_Read, static_cast<int>(fresh.inside.x), static_cast<int>(fresh.inside.y), width, height,
-      plane.At(fresh.column, fresh.row), width, height, source_.Type().gdal,
-      static_cast<int>(bands.size()), const_cast<int*>(bands.data()),
-      static_cast<GSpacing>(plane.PixelBytes()), static_cast<GSpacing>(plane.Stride()),
-      static_cast<GSpacing>(source_.Type().Bytes()), nullptr);
+  CPLErr result = CE_None;
+  if (AreLeadingBands(bands)) {
+    result = source_.Dataset().RasterIO(
+        GF_Read, x, y, width, height, first, width, height, type, static_cast<int>(bands.size()),
+        const_cast<int*>(bands.data()), pixelBytes, stride, sampleBytes, nullptr);
+  } else {
+    for (std::size_t i = 0; i < bands.size(); ++i) {
+      GDALRasterBand& band = *source_.Dataset().GetRasterBand(bands[i]);
+      result = std::max(
+          result, band.RasterIO(GF_Read, x, y, width, height, first + i * source_.Type().Bytes(),
+                                width, height, type, pixelBytes, stride, nullptr));
+    }
+  }
   if (result != CE_None) {
     throw RunError("cannot read " + source_.Name() + ": " + LastGdalMessage(source_.Name()));
   }

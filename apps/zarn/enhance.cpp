@@ -2,10 +2,13 @@
 #include "apps/zarn/enhance.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cstdint>
+#include <filesystem>
 #include <memory>
 #include <optional>
 #include <string>
+#include <system_error>
 #include <utility>
 #include <vector>
 
@@ -25,6 +28,7 @@ namespace zarn::app {
 namespace {
 
 namespace filters = processes::filters;
+namespace fs = std::filesystem;
 using MatrixPtr = std::unique_ptr<filters::IGeoLUTMatrix>;
 
 struct EnhanceOptions {
@@ -55,15 +59,17 @@ int CellsAlong(int pixels, std::int64_t tile) {
 
 filters::GLUTParameters ParametersFor(const EnhanceOptions& options, const RasterSource& source) {
   const bool isPercentage = options.trim == "percentage";
-  // A tile that holds the whole image is as good as any larger one.
-  const auto tile = static_cast<std::int32_t>(
-      std::min<std::int64_t>(options.tileSize, std::max(source.Width(), source.Height())));
+  // A tile that reaches from edge to edge is as good as any longer one.
+  const auto width =
+      static_cast<std::int32_t>(std::min<std::int64_t>(options.tileSize, source.Width()));
+  const auto height =
+      static_cast<std::int32_t>(std::min<std::int64_t>(options.tileSize, source.Height()));
   return {.trimMethod = static_cast<std::int32_t>(isPercentage ? filters::TrimMethod::kPercentage
                                                                : filters::TrimMethod::kMeanNSigma),
-          .tileWidth = tile,
-          .tileHeight = tile,
-          .gridRows = CellsAlong(source.Height(), tile),
-          .gridColumns = CellsAlong(source.Width(), tile),
+          .tileWidth = width,
+          .tileHeight = height,
+          .gridRows = CellsAlong(source.Height(), height),
+          .gridColumns = CellsAlong(source.Width(), width),
           .channelCount = static_cast<std::int32_t>(source.Channels().size()),
           .leftTrim = TrimOption("--left", options.left, isPercentage),
           .rightTrim = TrimOption("--right", options.right, isPercentage),
@@ -79,11 +85,16 @@ std::vector<float> MaxGains(const EnhanceOptions& options, std::size_t channels)
                      " values; give one for all bands or one for each of the " +
                      std::to_string(channels));
   }
+  for (const double gain : given) {
+    if (!(gain > 0)) throw UsageError("--max-gain " + options.maxGain + " is not above 0");
+  }
   return {given.begin(), given.end()};
 }
 
 MatrixPtr MakeMatrix(const EnhanceOptions& options, const RasterSource& source,
                      const NoDataValues& noData, const StagingFolder* diagnostic) {
+  std::vector<float> maxGains;
+  if (!options.maxGain.empty()) maxGains = MaxGains(options, source.Channels().size());
   MatrixPtr matrix(filters::GLUT::GetGLUTMatrix(ParametersFor(options, source)));
   if (!matrix) throw RunError("--tile-size makes too many tiles; give a larger one");
   std::optional<MaskFile> mask;
@@ -93,9 +104,7 @@ MatrixPtr MakeMatrix(const EnhanceOptions& options, const RasterSource& source,
   matrix->SetHostData(&progress);
   matrix->LoadFromImage(reader);
   matrix->SetHostData(nullptr);
-  if (!options.maxGain.empty()) {
-    matrix->ValidateMaxGain(MaxGains(options, source.Channels().size()).data());
-  }
+  if (!maxGains.empty()) matrix->ValidateMaxGain(maxGains.data());
   matrix->Clean({.globalFilter = true, .localFilter = true});
   if (diagnostic != nullptr) {
     ClassFile classes(*diagnostic, source);
@@ -131,12 +140,22 @@ filters::FilterResult RequireBytesOrWords(const WindowBlocks& blocks) {
       "only unsigned integers of 8 and 16 bits have levels to stretch");
 }
 
+// By any spelling, and whether it exists or not.
+bool IsSameFile(const fs::path& a, const fs::path& b) {
+  std::error_code error;
+  return fs::equivalent(a, b, error) ||
+         fs::weakly_canonical(a, error) == fs::weakly_canonical(b, error);
+}
+
 void Run(const EnhanceOptions& options) {
   std::optional<StagingFolder> diagnostic;
   if (!options.diagnostic.empty()) {
-    if (options.diagnostic == options.image.output.target ||
-        options.diagnostic == options.image.input) {
-      throw UsageError("--diagnostic names a file that is IN or OUT");
+    for (const std::string& name :
+         {options.image.input, options.image.output.target, options.image.mask}) {
+      if (!name.empty() && IsSameFile(options.diagnostic, name)) {
+        throw UsageError("--diagnostic " + options.diagnostic + " is " + name +
+                         "; name another file");
+      }
     }
     diagnostic.emplace(options.diagnostic, options.image.output.overwrite);
   }
@@ -165,14 +184,20 @@ void AddEnhanceCommand(CLI::App& app) {
   const auto options = std::make_shared<EnhanceOptions>();
   command.add_option("--tile-size", options->tileSize, "Side of a tile in pixels")
       ->type_name("N")
-      ->check(WholeNumber(2, std::nullopt))
+      ->check(WholeNumber(2, 4096))
       ->capture_default_str();
   command
       .add_option(
           "--power", options->power,
           "Exponent of the stretch: below 1 brightens the dark levels, above 1 darkens them")
       ->type_name("P")
-      ->check(CLI::Range(0.05, 20.0).description(""))
+      ->check(CLI::Validator(
+          [](const std::string& text) {
+            const double power = ParseNumber("--power", text);
+            const bool isInRange = power >= 0.05 && power <= 5;  // not so for NaN
+            return isInRange ? std::string() : "'" + text + "' is not from 0.05 to 5";
+          },
+          ""))
       ->capture_default_str();
   command
       .add_option("--trim", options->trim,

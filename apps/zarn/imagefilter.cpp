@@ -150,14 +150,15 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
   RequireSampleType(source, maker.probe(source));
   NoDataValues noData = ResolveNoData(source, options.srcNoData, options.dstNoData);
   if (!maker.computes) noData.input.clear();
-  const FittedFilter fitted = maker.fit(source, noData);
   std::optional<MaskFile> mask;
   if (!options.mask.empty()) {
     mask.emplace(options.mask, source);
     RefuseMaskAsOutput(options);
   }
 
+  // First, because fitting may read the whole image.
   StagedOutput output(options.output, source, noData.output);
+  const FittedFilter fitted = maker.fit(source, noData);
   BlockReader reader(source, noData,
                      {.halo = fitted.halo,
                       .mask = mask ? &*mask : nullptr,

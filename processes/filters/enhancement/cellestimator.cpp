@@ -45,7 +45,7 @@ CellStatus CellEstimator<T>::Estimate(const TilePixels<T>& tile, CellGrid& grid,
                                       std::uint64_t* histogram) const {
   const std::int64_t whole = std::int64_t{parameters_.tileWidth} * parameters_.tileHeight;
   const std::int64_t valid = CountValid(tile);
-  if (valid == 0 || valid < whole / kLeastShare) return CellStatus::kNoData;
+  if (valid == 0 || valid * kLeastShare < whole) return CellStatus::kNoData;
   CellStatus status = CellStatus::kValid;
   for (int c = 0; c < grid.Channels(); ++c) {
     AddSamples(tile, static_cast<std::size_t>(grid.Channels()), static_cast<std::size_t>(c),

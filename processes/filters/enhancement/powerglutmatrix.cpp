@@ -231,32 +231,38 @@ template <typename T>
 void PowerGLUTMatrix<T>::ValidateMaxGain(const float* maxGains) {
   std::mutex mutex;
   int done = 0;
-  bool isCancelled = false;
+  std::exception_ptr failure;
   const auto exceeds = [&](std::size_t cell) {
     for (int c = 0; c < grid_.Channels(); ++c) {
       if (grid_.Gain(cell, c) > maxGains[c]) return true;
     }
     return false;
   };
-  parallel::ForEachRowBandRethrowing(grid_.Rows(), parallel::BandCount(grid_.Rows()),
-                                     [&](std::ptrdiff_t, std::ptrdiff_t begin, std::ptrdiff_t end) {
-                                       for (std::ptrdiff_t row = begin; row < end; ++row) {
-                                         for (int column = 0; column < grid_.Columns(); ++column) {
-                                           const std::size_t cell =
-                                               grid_.Cell(static_cast<int>(row), column);
-                                           if (grid_.IsValid(cell) && exceeds(cell)) {
-                                             grid_.SetStatus(cell, CellStatus::kInvalid);
-                                           }
-                                         }
-                                         // The counter must not be called by two threads; a row is
-                                         // long against the wait.
-                                         const std::lock_guard lock(mutex);
-                                         if (isCancelled) continue;
-                                         isCancelled = true;
-                                         Tell(static_cast<double>(++done) / grid_.Rows(), "");
-                                         isCancelled = false;
-                                       }
-                                     });
+  // The counter must not be called by two threads; a row is long against the wait. What it throws
+  // waits until all rows are judged.
+  const auto tell = [&] {
+    const std::lock_guard lock(mutex);
+    ++done;
+    if (failure) return;
+    try {
+      Tell(static_cast<double>(done) / grid_.Rows(), "");
+    } catch (...) {
+      failure = std::current_exception();
+    }
+  };
+  parallel::ForEachRowBand(grid_.Rows(), parallel::BandCount(grid_.Rows()),
+                           [&](std::ptrdiff_t, std::ptrdiff_t begin, std::ptrdiff_t end) {
+                             for (auto row = static_cast<int>(begin); row < end; ++row) {
+                               for (int column = 0; column < grid_.Columns(); ++column) {
+                                 const std::size_t cell = grid_.Cell(row, column);
+                                 if (grid_.IsValid(cell) && exceeds(cell)) {
+                                   grid_.SetStatus(cell, CellStatus::kInvalid);
+                                 }
+                               }
+                               tell();
+                             }
+                           });
+  if (failure) std::rethrow_exception(failure);
 }
 
 template <typename T>

@@ -156,6 +156,10 @@ TEST_F(Average, TreatsTransparentPixelsAsInvalidAndCopiesAlpha) {
   EXPECT_EQ(OpenImage(folder_ / "out.tif")->GetRasterBand(4)->GetColorInterpretation(),
             GCI_AlphaBand);
 
+  // A layout whose bands GDAL confuses when several threads decode them.
+  WriteInput(image, nullptr, {"PHOTOMETRIC=RGB", "ALPHA=YES", "INTERLEAVE=BAND", "BLOCKYSIZE=7"});
+  EXPECT_EQ(Difference(expected, Filter({"--threads", "2"})), "");
+
   for (int y = 0; y < 30; ++y) {
     for (int x = 0; x < 40; ++x) {
       for (int band = 0; band < 3 && !isValid(x, y); ++band) expected.At(x, y, band) = 200;

@@ -274,9 +274,12 @@ TEST_F(Enhance, RefusesWhatMakesNoSense) {
       {{"--trim", "sigma", "--right", "-1", in, out}, 2, "--right"},
       {{"--tile-size", "1", in, out}, 2, "--tile-size"},
       {{"--power", "0", in, out}, 2, "--power"},
+      {{"--power", "nan", in, out}, 2, "--power"},
+      {{"--max-gain", "-1", in, out}, 2, "--max-gain"},
       {{"--max-gain", "1,2", in, out}, 2, "--max-gain"},
       {{"--max-gain", "0.001", in, out}, 1, "--max-gain"},
       {{"--diagnostic", out, in, out}, 2, "--diagnostic"},
+      {{"--overwrite", "--diagnostic", folder_ / "./in.tif", in, out}, 2, "--diagnostic"},
       {{"--diagnostic", folder_ / "flat.tif", in, out}, 1, "flat.tif"},
   };
   for (const auto& c : cases) {

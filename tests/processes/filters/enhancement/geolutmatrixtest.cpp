@@ -231,8 +231,10 @@ TEST(GeoLUTMatrix, ValidatesByMaximumGain) {
   WatchingCounter cancelling;
   cancelling.cancelAt = 3;
   matrix->SetHostData(&cancelling);
-  EXPECT_THROW(matrix->ValidateMaxGain(most), Exception);
+  const float none[] = {-1, -1};
+  EXPECT_THROW(matrix->ValidateMaxGain(none), Exception);
   EXPECT_EQ(cancelling.calls, 3);
+  for (int i = 0; i < 200; ++i) EXPECT_FALSE(matrix->IsValid(i / 5, i % 5)) << i;
 }
 
 // Tiles of 8 x 8 pixels with levels from `low` on, 64 of them; what differs is told by the cell.
