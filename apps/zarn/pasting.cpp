@@ -307,10 +307,10 @@ void Paste(const Pasting& pasting, const WorkOptions& work, bool checkFirst, Upd
        .halo = 0,
        .sampleBytes = paster.SampleBytes(),
        .sideBytes = paster.SideBytes(),
-       .fewestRows = kFewestRows,
        .slots = kStreamSlots,
        .memory = static_cast<std::size_t>(work.memory) << 20,
-       .forced = ParseWindow(work.window)});
+       .forced = ParseWindow(work.window),
+       .fewestRows = kFewestRows});
   FitBlockCache(pasting.source, plan, 0);
   const sys::OMPThreadCount threads(work.threads > 0 ? work.threads : sys::OMPGetMaxThreads());
   const bool checks = checkFirst && pasting.stopOnNoData;

@@ -29,10 +29,10 @@ struct WindowRequest {
   std::int64_t halo = 0;             ///< pixels needed around a window on every side
   std::size_t sampleBytes = 0;       ///< bytes of a pixel in a block that the filter sees
   std::size_t sideBytes = 0;         ///< bytes of what is read beside it: alpha, masks
-  std::int64_t fewestRows = 0;       ///< of a window, where memory allows
   std::size_t slots = 1;             ///< windows in memory at a time
   std::size_t memory = 0;            ///< bytes that they may take together
   std::optional<WindowSize> forced;  ///< the size of the windows, instead of choosing it
+  std::int64_t fewestRows = 0;       ///< of a window, where memory allows
 };
 
 /// Cuts an image into windows: columns from left to right, each from top to bottom, so that the
