@@ -65,7 +65,6 @@ ZARN_VECTORISED void CurveValues(const PowerCurve& curve, float top, const std::
                                  std::size_t count, float* values) {
   const float gain = curve.gain;
   const std::int32_t high = curve.high;
-#pragma GCC ivdep
   for (std::size_t i = 0; i < count; ++i) {
     const float least = levels[i] >= high ? top : 0.0F;
     float value = gain * values[i];
@@ -78,13 +77,11 @@ ZARN_VECTORISED void CurveValues(const PowerCurve& curve, float top, const std::
 // What lies between two rows of values, at `weight` of the way.
 ZARN_VECTORISED void BlendRows(const float* above, const float* below, float weight,
                                std::size_t count, float* blended) {
-#pragma GCC ivdep
   for (std::size_t i = 0; i < count; ++i) blended[i] = above[i] + (below[i] - above[i]) * weight;
 }
 
 ZARN_VECTORISED void BlendColumns(const float* left, const float* right, const float* weights,
                                   std::size_t count, std::int32_t* results) {
-#pragma GCC ivdep
   for (std::size_t i = 0; i < count; ++i) {
     results[i] = static_cast<std::int32_t>(left[i] + (right[i] - left[i]) * weights[i] + 0.5F);
   }

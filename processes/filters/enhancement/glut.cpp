@@ -8,6 +8,7 @@
 #include "processes/filters/enhancement/glutdiagnostics.h"
 #include "processes/filters/enhancement/powerglutmatrix.h"
 
+// NOLINTNEXTLINE(readability-identifier-naming): hosts know it by this name
 namespace zarn::processes::filters::GLUT {
 namespace {
 

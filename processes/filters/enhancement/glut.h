@@ -6,6 +6,7 @@
 #include "processes/filters/enhancement/igeolutmatrix.h"
 #include "processes/filters/filtersexport.h"
 
+// NOLINTNEXTLINE(readability-identifier-naming): hosts know it by this name
 namespace zarn::processes::filters::GLUT {
 
 /// A new matrix, which the caller owns. Null when the pixel depth is neither 8 nor 16, when a size
