@@ -62,8 +62,9 @@ std::vector<std::size_t> ValidNeighbours(const CellGrid& grid, std::size_t cell)
 bool DiffersFrom(const CellGrid& grid, std::size_t cell, const std::vector<std::size_t>& others) {
   constexpr double kSigmasOfDeviation = 1.4826;  // of a normal distribution
   for (int c = 0; c < grid.Channels(); ++c) {
-    std::vector<double> logs;
-    for (const std::size_t other : others) logs.push_back(LogOfGain(grid, other, c));
+    std::vector<double> logs(others.size());
+    std::transform(others.begin(), others.end(), logs.begin(),
+                   [&](std::size_t other) { return LogOfGain(grid, other, c); });
     const double median = Median(logs);
     for (double& value : logs) value = std::abs(value - median);
     const double spread = std::max(kSigmasOfDeviation * Median(logs), kLeastSpread);
@@ -252,8 +253,10 @@ void RunGlobalFilter(CellGrid& grid) {
   std::vector<std::size_t> cells;
   std::vector<double> points;
   for (const std::size_t cell : ValidCells(grid)) {
-    std::vector<double> logs;
-    for (int c = 0; c < grid.Channels(); ++c) logs.push_back(LogOfGain(grid, cell, c));
+    std::vector<double> logs(dimensions);
+    for (std::size_t c = 0; c < dimensions; ++c) {
+      logs[c] = LogOfGain(grid, cell, static_cast<int>(c));
+    }
     if (!std::all_of(logs.begin(), logs.end(), [](double v) { return std::isfinite(v); })) continue;
     cells.push_back(cell);
     points.insert(points.end(), logs.begin(), logs.end());
