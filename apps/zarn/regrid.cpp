@@ -12,6 +12,7 @@
 #include "apps/zarn/blockwriter.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/gridmover.h"
 #include "apps/zarn/maskfile.h"
 #include "apps/zarn/pipeline.h"
 #include "apps/zarn/progress.h"
@@ -25,27 +26,16 @@ namespace {
 // Larger windows gain nothing; a turned image draws on more of the source the wider they are.
 constexpr std::int64_t kLargestSide = 1024;
 
-std::int64_t Pixels(const Window& window) { return window.width * window.height; }
-
-/// One window of the output on its way.
-struct Slot {
-  std::unique_ptr<PixelMover> mover;
-  WindowBuffers source;
-  WindowBuffers result;
-  Plane covered;
-  bool filled = false;  ///< already while it was read, in parts
-};
-
 class Regridder {
  public:
   Regridder(const RasterSource& source, const Regridding& plan, const NoDataValues& noData,
             BlockReader& reader, std::int64_t mostSourcePixels)
-      : source_(source),
-        noData_(noData.output),
-        reader_(reader),
-        mostSourcePixels_(mostSourcePixels),
-        writesMask_(MasksUncovered(source, noData)) {
-    for (Slot& slot : slots_) slot.mover = plan.makeMover();
+      : mover_(source, reader,
+               {.fill = noData.output,
+                .movesAlphas = true,
+                .writesMask = MasksUncovered(source, noData),
+                .mostSourcePixels = mostSourcePixels}) {
+    for (GridMover::Slot& slot : slots_) slot.mover = plan.makeMover();
   }
 
   /// Whether only a mask can tell covered pixels from uncovered ones.
@@ -55,11 +45,10 @@ class Regridder {
 
   void Stream(const WindowPlan& plan, BlockWriter& writer, nspio::Counter& progress) {
     const Stage read = [&](std::size_t index, std::size_t slot) {
-      Read(plan.At(index), slots_[slot]);
+      mover_.Read(plan.At(index), slots_[slot]);
+      drawsOnSource_ |= slots_[slot].drawsOnSource;
     };
-    const Stage move = [&](std::size_t, std::size_t slot) {
-      if (!slots_[slot].filled) Fill(slots_[slot], slots_[slot].result.window);
-    };
+    const Stage move = [&](std::size_t, std::size_t slot) { mover_.Fill(slots_[slot]); };
     const Stage write = [&](std::size_t index, std::size_t slot) {
       writer.Write(slots_[slot].result);
       progress.Update(static_cast<double>(index + 1) / static_cast<double>(plan.Count()));
@@ -71,109 +60,9 @@ class Regridder {
   bool DrawsOnSource() const { return drawsOnSource_; }
 
  private:
-  void Read(const Window& window, Slot& slot) {
-    Shape(window, slot);
-    slot.mover->Enter(window);
-    slot.filled = !Fits(slot.mover->SourceOf(window));
-    if (slot.filled) {
-      FillInParts(slot, window);
-    } else {
-      ReadSource(slot, window);
-    }
-  }
-
-  bool Fits(const Window& source) const { return Pixels(source) <= mostSourcePixels_; }
-
-  void Shape(const Window& window, Slot& slot) const {
-    const std::size_t bytes = source_.Type().Bytes();
-    WindowBuffers& result = slot.result;
-    result.window = window;
-    result.output.Shape(window.width, window.height, source_.Channels().size() * bytes);
-    result.alphas.Shape(window.width, window.height, source_.Alphas().size() * bytes);
-    result.fileMask.Shape(window.width, window.height, writesMask_ ? 1 : 0);
-    slot.covered.Shape(window.width, window.height, 1);
-    // What nothing covers must not show another window's pixels.
-    std::fill_n(result.output.Data(), result.output.Size(), std::byte{0});
-  }
-
-  void ReadSource(Slot& slot, const Window& part) {
-    const Window needed = slot.mover->SourceOf(part);
-    if (Pixels(needed) > 0) {
-      reader_.Read(needed, nullptr, slot.source);
-      drawsOnSource_ = true;
-    } else {
-      slot.source.window = needed;
-      slot.source.masked = false;
-    }
-  }
-
-  // Rows first: the parts of a window have to lie together in memory.
-  void FillInParts(Slot& slot, const Window& part) {
-    if (Fits(slot.mover->SourceOf(part)) || Pixels(part) == 1) {
-      ReadSource(slot, part);
-      Fill(slot, part);
-      return;
-    }
-    Window first = part;
-    Window second = part;
-    if (part.height > 1) {
-      first.height /= 2;
-      second.y += first.height;
-      second.height -= first.height;
-    } else {
-      first.width /= 2;
-      second.x += first.width;
-      second.width -= first.width;
-    }
-    FillInParts(slot, first);
-    FillInParts(slot, second);
-  }
-
-  gobs::Raster Block(const Window& window, const std::vector<int>& bands, Plane& plane,
-                     const Window& planes) const {
-    const gobs::RasterInfo info(static_cast<std::uint32_t>(window.width),
-                                static_cast<std::uint32_t>(window.height),
-                                static_cast<std::uint32_t>(bands.size()), source_.Type().code,
-                                {.marginX = 0,
-                                 .marginY = 0,
-                                 .originX = static_cast<std::uint32_t>(window.x),
-                                 .originY = static_cast<std::uint32_t>(window.y)});
-    if (Pixels(window) == 0) return gobs::Raster(info, nullptr, 0);
-    return gobs::Raster(info, plane.At(window.x - planes.x, window.y - planes.y),
-                        info.DescribedSize());
-  }
-
-  void Fill(Slot& slot, const Window& part) const {
-    WindowBuffers& from = slot.source;
-    WindowBuffers& to = slot.result;
-    const auto* const mask =
-        from.masked ? reinterpret_cast<const std::uint8_t*>(from.valid.Data()) : nullptr;
-    std::byte* const covered = slot.covered.At(part.x - to.window.x, part.y - to.window.y);
-    const auto move = [&](const std::vector<int>& bands, Plane& source, Plane& output,
-                          const std::vector<double>& fill) {
-      const gobs::Raster input = Block(from.window, bands, source, from.window);
-      gobs::Raster block = Block(part, bands, output, to.window);
-      slot.mover->Move(input, mask, fill, block, reinterpret_cast<std::uint8_t*>(covered));
-    };
-    if (to.alphas.Used()) {
-      move(source_.Alphas(), from.alphas, to.alphas,
-           std::vector<double>(source_.Alphas().size(), 0.0));
-    }
-    move(source_.Channels(), from.samples, to.output, noData_);
-    if (to.fileMask.Used()) {
-      std::transform(covered, covered + Pixels(part),
-                     to.fileMask.At(part.x - to.window.x, part.y - to.window.y),
-                     [](std::byte flag) { return flag == std::byte{0} ? flag : std::byte{255}; });
-    }
-  }
-
-  const RasterSource& source_;
-  const std::vector<double>& noData_;
-  BlockReader& reader_;
-  std::int64_t mostSourcePixels_;
-  bool writesMask_;
+  GridMover mover_;
   bool drawsOnSource_ = false;
-  std::array<Slot, kStreamSlots> slots_;
+  std::array<GridMover::Slot, kStreamSlots> slots_;
 };
 
 void RequireKnownType(const RasterSource& source) {
