@@ -108,6 +108,10 @@ void DeclareNoData(const RasterSource& source, const std::vector<double>& values
 
 }  // namespace
 
+bool NeedsMask(const RasterSource& source, const std::vector<double>& noData) {
+  return !source.Masks().empty() || (noData.empty() && source.Alphas().empty());
+}
+
 void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output,
                const OutputGrid* grid, bool masked) {
   for (int number = 1; number <= output.GetRasterCount(); ++number) {

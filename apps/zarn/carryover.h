@@ -10,6 +10,10 @@
 
 namespace zarn::app {
 
+/// Whether an output like `source` tells pixels without data by a mask: where the source does, and
+/// where there is nothing else to tell them by.
+bool NeedsMask(const RasterSource& source, const std::vector<double>& noData);
+
 /// Gives `output`, whose bands are those of `source` in the same order, the georeference, metadata,
 /// band descriptions, colours and mask band of `source`, and declares `noData` (one value per
 /// channel, or none). To be done before the first pixel is written, because formats place it all in

@@ -77,4 +77,10 @@ void RunPipeline(std::size_t jobs, std::size_t slots, const std::vector<Stage>& 
   conveyor.RethrowFailure();
 }
 
+void RunOnOneThread(std::size_t jobs, std::size_t slots, const std::vector<Stage>& stages) {
+  for (std::size_t job = 0; job < jobs; ++job) {
+    for (const Stage& stage : stages) stage(job, job % slots);
+  }
+}
+
 }  // namespace zarn::app

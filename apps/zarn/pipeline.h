@@ -19,4 +19,7 @@ using Stage = std::function<void(std::size_t job, std::size_t slot)>;
 void RunPipeline(std::size_t jobs, std::size_t slots, const std::vector<Stage>& stages,
                  std::size_t callersStage);
 
+/// The same on the calling thread alone, one job after the other.
+void RunOnOneThread(std::size_t jobs, std::size_t slots, const std::vector<Stage>& stages);
+
 }  // namespace zarn::app

@@ -22,6 +22,12 @@ class TerminalProgress : public nspio::Counter {
   int shown_ = -1;  ///< ticks printed, each a fortieth
 };
 
+/// Tells nobody.
+class SilentProgress : public nspio::Counter {
+ protected:
+  void Report(double, const std::string&) override {}
+};
+
 /// A part of a longer operation: maps 0..1 onto begin..end of `whole`.
 class ProgressSpan : public nspio::Counter {
  public:

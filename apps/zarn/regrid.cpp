@@ -10,6 +10,7 @@
 
 #include "apps/zarn/blockreader.h"
 #include "apps/zarn/blockwriter.h"
+#include "apps/zarn/carryover.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/gridmover.h"
@@ -33,14 +34,9 @@ class Regridder {
       : mover_(source, reader,
                {.fill = noData.output,
                 .movesAlphas = true,
-                .writesMask = MasksUncovered(source, noData),
+                .writesMask = NeedsMask(source, noData.output),
                 .mostSourcePixels = mostSourcePixels}) {
     for (GridMover::Slot& slot : slots_) slot.mover = plan.makeMover();
-  }
-
-  /// Whether only a mask can tell covered pixels from uncovered ones.
-  static bool MasksUncovered(const RasterSource& source, const NoDataValues& noData) {
-    return !source.Masks().empty() || (noData.output.empty() && source.Alphas().empty());
   }
 
   void Stream(const WindowPlan& plan, BlockWriter& writer, nspio::Counter& progress) {
@@ -101,7 +97,7 @@ void RunRegridding(const ImageFilterOptions& options,
 
   StagedOutput output(options.output, source, noData.output,
                       regridding.grid ? &*regridding.grid : nullptr,
-                      Regridder::MasksUncovered(source, noData));
+                      NeedsMask(source, noData.output));
   BlockReader reader(source, noData, {.mask = mask ? &*mask : nullptr, .marksNoData = true});
   BlockWriter writer(source, output.Dataset(), output.Name());
   int blockWidth = 1;

@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "apps/zarn/errors.h"
+#include "apps/zarn/gridoptions.h"
 #include "apps/zarn/interpolation.h"
 #include "apps/zarn/nodata.h"
 #include "apps/zarn/positionfield.h"
@@ -36,48 +37,6 @@ struct ResampleOptions {
   double threshold = 0.125;
 };
 
-void RequireNumbers(const std::string& option, const std::vector<double>& values) {
-  for (const double value : values) {
-    if (!std::isfinite(value)) throw UsageError(option + ": all values must be finite numbers");
-  }
-}
-
-int CountPixels(double extent, double size) {
-  const double count = std::floor(extent / size + 0.5);
-  if (count > std::numeric_limits<int>::max()) {
-    throw UsageError(
-        "the output would have more than 2147483647 columns or rows; use a larger --tr");
-  }
-  return std::max(1, static_cast<int>(count));
-}
-
-// The suggested grid with the extent and the pixel size that were asked for.
-OutputGrid Adjusted(OutputGrid grid, const ResampleOptions& options) {
-  auto& [left, pixelWidth, skewX, top, skewY, pixelHeight] = grid.transform;
-  if (options.extent.empty() && options.resolution.empty()) return grid;
-  double right = left + pixelWidth * grid.width;
-  double bottom = top + pixelHeight * grid.height;
-  if (!options.extent.empty()) {
-    left = options.extent[0];
-    bottom = options.extent[1];
-    right = options.extent[2];
-    top = options.extent[3];
-    if (!(left < right && bottom < top)) {
-      throw UsageError("--te: write it as XMIN YMIN XMAX YMAX, with XMIN < XMAX and YMIN < YMAX");
-    }
-  }
-  const bool hasSize = !options.resolution.empty();
-  const double width = hasSize ? options.resolution[0] : pixelWidth;
-  const double height = hasSize ? options.resolution[1] : -pixelHeight;
-  if (!(width > 0 && height > 0)) throw UsageError("--tr: both values must be greater than 0");
-  grid.width = CountPixels(right - left, width);
-  grid.height = CountPixels(top - bottom, height);
-  // Without a size of its own the pixel takes the one that fills the extent exactly.
-  pixelWidth = hasSize ? width : (right - left) / grid.width;
-  pixelHeight = hasSize ? -height : (bottom - top) / grid.height;
-  return grid;
-}
-
 OutputGrid GridOf(const std::string& name) {
   const DatasetPtr dataset = OpenRaster(name);
   OutputGrid grid;
@@ -90,18 +49,6 @@ OutputGrid GridOf(const std::string& name) {
   return grid;
 }
 
-OGRSpatialReference ParseCrs(const std::string& text) {
-  OGRSpatialReference crs;
-  CPLPushErrorHandler(CPLQuietErrorHandler);
-  const bool known = crs.SetFromUserInput(text.c_str()) == OGRERR_NONE;
-  CPLPopErrorHandler();
-  if (!known) {
-    throw UsageError("--t-srs: '" + text +
-                     "' is not a coordinate system that GDAL knows; for example EPSG:32633");
-  }
-  return crs;
-}
-
 Regridding Fit(const ResampleOptions& options, const RasterSource& source) {
   const ResampleMethod method = MethodOf(options.method);
   if (method != ResampleMethod::kNearest) source.RefusePalette();
@@ -110,7 +57,7 @@ Regridding Fit(const ResampleOptions& options, const RasterSource& source) {
   if (!options.crs.empty()) grid.crs = ParseCrs(options.crs);
   const auto locator = std::make_shared<SourceLocator>(
       source, grid.crs.IsEmpty() ? nullptr : &grid.crs, options.rpcDem);
-  if (options.like.empty()) grid = Adjusted(locator->SuggestGrid(), options);
+  if (options.like.empty()) grid = Adjusted(locator->SuggestGrid(), options.extent, options.resolution);
   // A grid to follow that names no coordinate system is taken to be in that of the source.
   grid.crs = locator->Crs();
   locator->SetGrid(grid);

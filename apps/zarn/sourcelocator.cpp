@@ -10,6 +10,7 @@
 
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/wkt.h"
 
 namespace zarn::app {
 namespace {
@@ -51,15 +52,6 @@ void RequirePlace(const RasterSource& source, bool needsCrs) {
                    ": it names no coordinate system to come from; give it one with gdal_edit.py "
                    "-a_srs");
   }
-}
-
-std::string WktOf(const OGRSpatialReference& crs) {
-  char* text = nullptr;
-  const char* const options[] = {"FORMAT=WKT2_2018", nullptr};
-  if (crs.exportToWkt(&text, options) != OGRERR_NONE) return {};
-  std::string wkt = text;
-  CPLFree(text);
-  return wkt;
 }
 
 }  // namespace

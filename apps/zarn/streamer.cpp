@@ -9,7 +9,15 @@
 #include "apps/zarn/pipeline.h"
 
 namespace zarn::app {
-namespace {
+gobs::RasterInfo DescribeBlock(const Window& window, std::size_t channels,
+                               gobs::NativeDataTypeCode type, std::int64_t halo) {
+  const auto margin = static_cast<std::uint32_t>(halo);
+  return gobs::RasterInfo(static_cast<std::uint32_t>(window.width),
+                          static_cast<std::uint32_t>(window.height),
+                          static_cast<std::uint32_t>(channels), type,
+                          gobs::BlockFrame{margin, margin, static_cast<std::uint32_t>(window.x),
+                                           static_cast<std::uint32_t>(window.y)});
+}
 
 void FilterWindow(const RasterSource& source, const BlockFunction& filter, WindowBuffers& buffers) {
   const auto channels = source.Channels().size();
@@ -34,18 +42,6 @@ void FilterWindow(const RasterSource& source, const BlockFunction& filter, Windo
                               buffers.labels.Data(), buffers.labels.Size());
   blocks.labels = &labels;
   filter(blocks);
-}
-
-}  // namespace
-
-gobs::RasterInfo DescribeBlock(const Window& window, std::size_t channels,
-                               gobs::NativeDataTypeCode type, std::int64_t halo) {
-  const auto margin = static_cast<std::uint32_t>(halo);
-  return gobs::RasterInfo(static_cast<std::uint32_t>(window.width),
-                          static_cast<std::uint32_t>(window.height),
-                          static_cast<std::uint32_t>(channels), type,
-                          gobs::BlockFrame{margin, margin, static_cast<std::uint32_t>(window.x),
-                                           static_cast<std::uint32_t>(window.y)});
 }
 
 void StreamWindows(const RasterSource& source, const WindowPlan& plan, BlockReader& reader,

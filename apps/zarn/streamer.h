@@ -32,6 +32,9 @@ struct WindowBlocks {
 /// Filters one window.
 using BlockFunction = std::function<void(const WindowBlocks& blocks)>;
 
+/// Filters one window that was read, from its samples into its output.
+void FilterWindow(const RasterSource& source, const BlockFunction& filter, WindowBuffers& buffers);
+
 /// Takes all windows of `plan` through reader, `filter` and writer, which overlap. `filter` runs on
 /// the calling thread. The first exception of any of them is rethrown.
 void StreamWindows(const RasterSource& source, const WindowPlan& plan, BlockReader& reader,

@@ -10,7 +10,6 @@
 #include <vector>
 
 #include "apps/zarn/errors.h"
-#include "apps/zarn/estimate/cellmeans.h"
 #include "apps/zarn/estimate/comparisonoptions.h"
 #include "apps/zarn/estimate/gainoffsetnetwork.h"
 #include "apps/zarn/estimate/sceneset.h"
@@ -56,29 +55,6 @@ std::vector<std::string> Targets(const FitGainOffsetOptions& options) {
     targets.push_back((fs::path(options.folder) / name).string());
   }
   return targets;
-}
-
-std::vector<SceneOverlap> FindOverlaps(const SceneSet& scenes) {
-  std::vector<SceneOverlap> overlaps;
-  for (std::size_t first = 0; first < scenes.Size(); ++first) {
-    for (std::size_t second = first + 1; second < scenes.Size(); ++second) {
-      const std::vector<CellPair> cells = scenes.Common(first, second);
-      if (cells.size() < kLeastCommonCells) continue;
-      overlaps.push_back({first, second, RobustMoments(cells, scenes.Channels())});
-    }
-  }
-  return overlaps;
-}
-
-void RequireTied(const SceneSet& scenes, const std::vector<SceneOverlap>& overlaps) {
-  const std::vector<bool> tied = TiedScenes(scenes.Size(), overlaps);
-  std::string loose;
-  for (std::size_t i = 0; i < tied.size(); ++i) {
-    if (!tied[i]) loose += (loose.empty() ? "" : ", ") + scenes.Sources()[i].Name();
-  }
-  if (loose.empty()) return;
-  throw RunError("no valid overlap ties these to " + scenes.Sources().front().Name() +
-                 ", neither directly nor through the others: " + loose);
 }
 
 using Corrections = std::vector<std::vector<GainOffset>>;
@@ -151,7 +127,7 @@ void FitGainOffset(const FitGainOffsetOptions& options) {
     scenes.Measure(options.cell, progress);
   }
   const std::vector<SceneOverlap> overlaps = FindOverlaps(scenes);
-  RequireTied(scenes, overlaps);
+  RequireTied(scenes, overlaps, "leave them out");
   const Corrections corrections =
       SolveGainOffsets(scenes.Size(), overlaps, scenes.Channels(), options.limits);
 

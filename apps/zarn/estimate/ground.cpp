@@ -45,7 +45,7 @@ void RequireSameSystem(const RasterSource& first, const RasterSource& other) {
   }
 }
 
-void RequireComparable(const RasterSource& first, const RasterSource& other) {
+void RequireSameSamples(const RasterSource& first, const RasterSource& other) {
   if (other.Type() != first.Type()) {
     throw RunError(other.Name() + " is " + other.Type().Name() + ", but " + first.Name() + " is " +
                    first.Type().Name() + "; bring it to one type with gdal_translate -ot");
@@ -56,6 +56,10 @@ void RequireComparable(const RasterSource& first, const RasterSource& other) {
                    std::to_string(first.Channels().size()) +
                    "; choose the same ones with gdal_translate -b");
   }
+}
+
+void RequireComparable(const RasterSource& first, const RasterSource& other) {
+  RequireSameSamples(first, other);
   RequireSameSystem(first, other);
 }
 
@@ -146,30 +150,32 @@ std::string TransformText(const RasterSource& source) {
 
 }  // namespace
 
-GridPlace PlaceOnGrid(const RasterSource& first, const RasterSource& other) {
-  const std::vector<Ground> grounds = GroundsOf({&first, &other});
-  const Ground& ground = grounds.front();
-  const Ground& otherGround = grounds.back();
+std::optional<GridPlace> FindOnGrid(const Ground& first, const Ground& other) {
   const auto columnOf = [&](double x, double y) {
-    return ground.Column(otherGround.X(x, y), otherGround.Y(x, y));
+    return first.Column(other.X(x, y), other.Y(x, y));
   };
-  const auto rowOf = [&](double x, double y) {
-    return ground.Row(otherGround.X(x, y), otherGround.Y(x, y));
-  };
+  const auto rowOf = [&](double x, double y) { return first.Row(other.X(x, y), other.Y(x, y)); };
   const double column = std::floor(columnOf(0, 0) + 0.5);
   const double row = std::floor(rowOf(0, 0) + 0.5);
-  for (const double x : {0.0, static_cast<double>(other.Width())}) {
-    for (const double y : {0.0, static_cast<double>(other.Height())}) {
+  for (const double x : {0.0, static_cast<double>(other.Size().width)}) {
+    for (const double y : {0.0, static_cast<double>(other.Size().height)}) {
       constexpr double kTolerance = 0.1;
       const double off =
           std::max(std::abs(columnOf(x, y) - x - column), std::abs(rowOf(x, y) - y - row));
-      if (off <= kTolerance && std::abs(column) < 0x1p40 && std::abs(row) < 0x1p40) continue;
-      throw RunError(other.Name() + " does not lie on the pixels of " + first.Name() +
-                     ": its geotransform is " + TransformText(other) + ", the other one " +
-                     TransformText(first) + "; bring it there with zarn resample --like");
+      const bool fits = off <= kTolerance && std::abs(column) < 0x1p40 && std::abs(row) < 0x1p40;
+      if (!fits) return std::nullopt;
     }
   }
-  return {static_cast<std::int64_t>(column), static_cast<std::int64_t>(row)};
+  return GridPlace{static_cast<std::int64_t>(column), static_cast<std::int64_t>(row)};
+}
+
+GridPlace PlaceOnGrid(const RasterSource& first, const RasterSource& other) {
+  const std::vector<Ground> grounds = GroundsOf({&first, &other});
+  const std::optional<GridPlace> place = FindOnGrid(grounds.front(), grounds.back());
+  if (place) return *place;
+  throw RunError(other.Name() + " does not lie on the pixels of " + first.Name() +
+                 ": its geotransform is " + TransformText(other) + ", the other one " +
+                 TransformText(first) + "; bring it there with zarn resample --like");
 }
 
 std::vector<Ground> ComparableGrounds(const std::vector<RasterSource>& sources) {

@@ -5,6 +5,7 @@
 
 #include <array>
 #include <cstdint>
+#include <optional>
 #include <vector>
 
 #include "apps/zarn/dataset.h"
@@ -32,6 +33,7 @@ class Ground {
  public:
   explicit Ground(const RasterSource& source);
 
+  const WindowSize& Size() const { return size_; }
   /// False: the file does not say where it lies, and map coordinates are pixels.
   bool Georeferenced() const { return georeferenced_; }
   /// Map coordinates of the point `column`, `row`; the first pixel's centre is 0.5, 0.5.
@@ -68,6 +70,9 @@ bool SameSystem(const OGRSpatialReference& a, const OGRSpatialReference& b);
 /// Throws `RunError` unless both images name the same coordinate system, or neither names one.
 void RequireSameSystem(const RasterSource& first, const RasterSource& other);
 
+/// Throws `RunError` unless both have one sample type and number of channels.
+void RequireSameSamples(const RasterSource& first, const RasterSource& other);
+
 /// Throws `RunError` unless both have one sample type, number of channels and coordinate system.
 void RequireComparable(const RasterSource& first, const RasterSource& other);
 
@@ -77,9 +82,14 @@ struct GridPlace {
   std::int64_t row = 0;
 };
 
-/// Where the first pixel of `other` lies on the grid of `first`. Throws `RunError` unless its
-/// pixels fall on whole pixels there, to a tenth of a pixel at every corner, in the same coordinate
-/// system. Images without georeference are taken to lie on one another and must be of one size.
+/// Where the first pixel of `other` lies on the grid of `first`; nothing unless its pixels fall on
+/// whole pixels there, to a tenth of a pixel at every corner. Both are taken to lie in one
+/// coordinate system.
+std::optional<GridPlace> FindOnGrid(const Ground& first, const Ground& other);
+
+/// The same for rasters. Throws `RunError` unless
+/// they fit so and name the same coordinate system. Images without georeference are taken to lie on
+/// one another and must be of one size.
 GridPlace PlaceOnGrid(const RasterSource& first, const RasterSource& other);
 
 /// The grounds of images that are to be compared pixel by pixel. Throws `RunError` unless all have

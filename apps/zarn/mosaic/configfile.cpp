@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/mosaic/configfile.h"
+
+#include <CLI/CLI.hpp>
+#include <fstream>
+#include <nlohmann/json.hpp>
+#include <vector>
+
+#include "apps/zarn/errors.h"
+
+namespace zarn::app {
+namespace {
+
+using nlohmann::json;
+
+std::string TextOf(const json& value) {
+  return value.is_string() ? value.get<std::string>() : value.dump();
+}
+
+CLI::Option* Find(CLI::App& command, const std::string& key) {
+  if (CLI::Option* const option = command.get_option_no_throw("--" + key)) return option;
+  std::string upper = key;
+  for (char& c : upper) c = static_cast<char>(CLI::detail::to_lower(std::string(1, c))[0]);
+  for (CLI::Option* const option : command.get_options()) {
+    if (option->get_positional() && CLI::detail::to_lower(option->get_name(true)) == upper) {
+      return option;
+    }
+  }
+  return nullptr;
+}
+
+void Set(CLI::Option& option, const json& value, const std::string& place) {
+  const bool isFlag = option.get_items_expected_max() == 0;
+  if (value.is_boolean() != isFlag || value.is_object() || value.is_null()) {
+    throw UsageError(place + ": expected " +
+                     (isFlag ? "true or false" : "a string, a number or a list") + ", found " +
+                     value.dump());
+  }
+  if (isFlag) {
+    if (value.get<bool>()) option.add_result("true");
+  } else if (value.is_array()) {
+    for (const json& entry : value) option.add_result(TextOf(entry));
+  } else {
+    option.add_result(TextOf(value));
+  }
+  if (option.count() == 0) return;
+  try {
+    option.run_callback();
+  } catch (const CLI::ParseError& error) {
+    throw UsageError(place + ": " + error.what());
+  }
+}
+
+}  // namespace
+
+void ApplyConfig(const std::string& file, CLI::App& command) {
+  std::ifstream stream(file, std::ios::binary);
+  if (!stream) throw UsageError("cannot read the configuration " + file);
+  json config;
+  try {
+    config = json::parse(stream);
+  } catch (const json::exception& error) {
+    throw UsageError(file + " is not JSON: " + error.what());
+  }
+  if (!config.is_object()) throw UsageError(file + ": expected an object of options");
+  for (const auto& [key, value] : config.items()) {
+    CLI::Option* const option = Find(command, key);
+    if (option == nullptr || key == "config" || key == "help") {
+      throw UsageError(file + ": there is no option '" + key + "' (see " + command.get_name() +
+                       " --help)");
+    }
+    if (option->count() == 0) Set(*option, value, file + ": '" + key + "'");
+  }
+}
+
+}  // namespace zarn::app

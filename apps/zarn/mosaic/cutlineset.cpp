@@ -1,0 +1,92 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/mosaic/cutlineset.h"
+
+#include <cpl_error.h>
+#include <ogrsf_frmts.h>
+
+#include <filesystem>
+#include <set>
+
+#include "apps/zarn/cutlinefile.h"
+#include "apps/zarn/errors.h"
+#include "apps/zarn/gdalruntime.h"
+
+namespace zarn::app {
+namespace {
+
+std::string Quoted(const std::string& text, char quote) {
+  std::string quoted(1, quote);
+  for (const char c : text) quoted += c == quote ? std::string(2, quote) : std::string(1, c);
+  return quoted + quote;
+}
+
+// The values of the field, each once.
+std::set<std::string> ValuesOf(const std::string& file, const std::string& field) {
+  CPLErrorReset();
+  const DatasetPtr dataset(GDALDataset::Open(
+      file.c_str(), GDAL_OF_VECTOR | GDAL_OF_READONLY | GDAL_OF_VERBOSE_ERROR));
+  if (!dataset) throw RunError("cannot open " + file + ": " + LastGdalMessage(file));
+  if (dataset->GetLayerCount() != 1) {
+    throw RunError(file + " has " + std::to_string(dataset->GetLayerCount()) +
+                   " layers; give cutlines as a file of one (ogr2ogr cutlines.gpkg " + file +
+                   " LAYER)");
+  }
+  OGRLayer& layer = *dataset->GetLayer(0);
+  const int index = layer.GetLayerDefn()->GetFieldIndex(field.c_str());
+  if (index < 0) {
+    std::string fields;
+    for (const OGRFieldDefn* const known : layer.GetLayerDefn()->GetFields()) {
+      fields += (fields.empty() ? "" : ", ") + std::string(known->GetNameRef());
+    }
+    throw UsageError(file + " has no field '" + field +
+                     "' that says which scene a cutline is for; name it with --cutline-id" +
+                     (fields.empty() ? "" : ": " + fields));
+  }
+  std::set<std::string> values;
+  for (const auto& feature : layer) values.insert(feature->GetFieldAsString(index));
+  return values;
+}
+
+bool Meet(const Window& a, const Window& b) {
+  return a.x < b.x + b.width && b.x < a.x + a.width && a.y < b.y + b.height && b.y < a.y + a.height;
+}
+
+Polygon PolygonOf(const processes::filters::PolygonParam& param) {
+  Polygon polygon;
+  polygon.vertices.assign(param.vertices, param.vertices + std::size_t{2} * param.vertexCount);
+  polygon.starts = {0};
+  if (param.parts != nullptr) {
+    polygon.starts.assign(param.parts + 1, param.parts + 1 + param.parts[0]);
+  }
+  return polygon;
+}
+
+}  // namespace
+
+void AssignCutlines(const std::string& file, const std::string& field, const RasterSource& mosaic,
+                    std::vector<ScenePlan>& scenes) {
+  const std::string key = field.empty() ? "scene" : field;
+  const std::set<std::string> values = ValuesOf(file, key);
+  for (ScenePlan& scene : scenes) {
+    std::string where;
+    for (const std::string& name :
+         {scene.label, std::filesystem::path(scene.File()).filename().string(), scene.File()}) {
+      if (!values.contains(name)) continue;
+      where = Quoted(key, '"') + " = " + Quoted(name, '\'');
+      break;
+    }
+    if (where.empty()) {
+      throw RunError(file + " has no cutline for " + scene.File() + ": none whose " + key +
+                     " is '" + scene.label + "'; add one, or leave the scene out");
+    }
+    const RasterPolygon polygon = LoadCutline({.file = file, .layer = {}, .where = where}, mosaic);
+    if (!Meet(polygon.PixelsWithin({mosaic.Width(), mosaic.Height()}, 0), scene.covers)) {
+      throw RunError("the cutline of " + scene.File() + " in " + file +
+                     " misses it; compare their extents with gdalinfo and ogrinfo, or leave the "
+                     "scene out");
+    }
+    scene.cutline = PolygonOf(polygon.Param());
+  }
+}
+
+}  // namespace zarn::app
