@@ -26,6 +26,7 @@
 #include "apps/zarn/median.h"
 #include "apps/zarn/minmaxlut.h"
 #include "apps/zarn/morph.h"
+#include "apps/zarn/mosaic/mosaic.h"
 #include "apps/zarn/noisefilter.h"
 #include "apps/zarn/polynomial.h"
 #include "apps/zarn/removeblobs.h"
@@ -47,7 +48,7 @@ int Fail(int status, std::string text) {
 
 std::string CommandOf(const CLI::App& app) {
   const auto parsed = app.get_subcommands();
-  return parsed.empty() ? "zarn" : "zarn " + parsed.front()->get_name();
+  return app.get_name() + (parsed.empty() ? "" : " " + CommandOf(*parsed.front()));
 }
 
 void AddCommands(CLI::App& app) {
@@ -67,6 +68,7 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddMedianCommand(app);
   zarn::app::AddMinMaxLutCommand(app);
   zarn::app::AddMorphCommand(app);
+  zarn::app::AddMosaicCommand(app);
   zarn::app::AddNoiseCommand(app);
   zarn::app::AddPolynomialCommand(app);
   zarn::app::AddDodgeCommand(app);
@@ -87,6 +89,7 @@ void RefuseEmptyValues(CLI::App& app) {
       "");
   for (CLI::App* const command : app.get_subcommands({})) {
     for (CLI::Option* const option : command->get_options()) option->check(notEmpty);
+    RefuseEmptyValues(*command);
   }
 }
 

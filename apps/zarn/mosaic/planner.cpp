@@ -425,8 +425,7 @@ void Planner::PlaceSeams(nspio::Counter& progress) {
       FindSeams(views, lattice, {.feather = static_cast<double>(plan_.feather) / survey.step},
                 progress);
   const std::vector<ScenePolygon> polygons =
-      SeamPolygons(planning_.labels, lattice, survey.step, 0.75);
-  std::vector<ScenePlan> shown;
+      SeamPolygons(planning_.labels, lattice, plan_.scenes.size(), survey.step, 0.75);
   for (std::size_t i = 0; i < plan_.scenes.size(); ++i) {
     Polygon& cutline = plan_.scenes[i].cutline;
     for (const auto& ring : polygons[i].rings) {
