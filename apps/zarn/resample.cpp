@@ -57,7 +57,8 @@ Regridding Fit(const ResampleOptions& options, const RasterSource& source) {
   if (!options.crs.empty()) grid.crs = ParseCrs(options.crs);
   const auto locator = std::make_shared<SourceLocator>(
       source, grid.crs.IsEmpty() ? nullptr : &grid.crs, options.rpcDem);
-  if (options.like.empty()) grid = Adjusted(locator->SuggestGrid(), options.extent, options.resolution);
+  if (options.like.empty())
+    grid = Adjusted(locator->SuggestGrid(), options.extent, options.resolution);
   // A grid to follow that names no coordinate system is taken to be in that of the source.
   grid.crs = locator->Crs();
   locator->SetGrid(grid);

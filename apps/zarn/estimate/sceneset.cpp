@@ -67,7 +67,7 @@ void RequireTied(const SceneSet& scenes, const std::vector<SceneOverlap>& overla
   }
   if (loose.empty()) return;
   throw RunError("no valid overlap ties these to " + scenes.Sources().front().Name() +
-                 ", neither directly nor through the others: " + loose);
+                 ", neither directly nor through the others: " + loose + "; " + remedy);
 }
 
 }  // namespace zarn::app

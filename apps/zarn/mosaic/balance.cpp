@@ -85,7 +85,8 @@ DodgingGrid OnMosaic(DodgingGrid grid, const Survey& survey, const Window& area)
 /// The scenes of a survey as a set of which the anchor comes first.
 class Network {
  public:
-  Network(const Survey& survey, std::size_t anchor) : survey_(survey), order_(survey.scenes.size()) {
+  Network(const Survey& survey, std::size_t anchor)
+      : survey_(survey), order_(survey.scenes.size()) {
     std::iota(order_.begin(), order_.end(), std::size_t{0});
     std::rotate(order_.begin(), order_.begin() + static_cast<std::ptrdiff_t>(anchor),
                 order_.begin() + static_cast<std::ptrdiff_t>(anchor) + 1);

@@ -23,8 +23,8 @@ std::string Quoted(const std::string& text, char quote) {
 // The values of the field, each once.
 std::set<std::string> ValuesOf(const std::string& file, const std::string& field) {
   CPLErrorReset();
-  const DatasetPtr dataset(GDALDataset::Open(
-      file.c_str(), GDAL_OF_VECTOR | GDAL_OF_READONLY | GDAL_OF_VERBOSE_ERROR));
+  const DatasetPtr dataset(
+      GDALDataset::Open(file.c_str(), GDAL_OF_VECTOR | GDAL_OF_READONLY | GDAL_OF_VERBOSE_ERROR));
   if (!dataset) throw RunError("cannot open " + file + ": " + LastGdalMessage(file));
   if (dataset->GetLayerCount() != 1) {
     throw RunError(file + " has " + std::to_string(dataset->GetLayerCount()) +
@@ -35,8 +35,9 @@ std::set<std::string> ValuesOf(const std::string& file, const std::string& field
   const int index = layer.GetLayerDefn()->GetFieldIndex(field.c_str());
   if (index < 0) {
     std::string fields;
-    for (const OGRFieldDefn* const known : layer.GetLayerDefn()->GetFields()) {
-      fields += (fields.empty() ? "" : ", ") + std::string(known->GetNameRef());
+    const OGRFeatureDefn& known = *layer.GetLayerDefn();
+    for (int i = 0; i < known.GetFieldCount(); ++i) {
+      fields += (i == 0 ? "" : ", ") + std::string(known.GetFieldDefn(i)->GetNameRef());
     }
     throw UsageError(file + " has no field '" + field +
                      "' that says which scene a cutline is for; name it with --cutline-id" +

@@ -188,8 +188,8 @@ const MosaicOptions& Settle(ParsedOptions& parsed, CLI::App& command) {
 }
 
 void AddPlanCommand(CLI::App& mosaic) {
-  CLI::App& command = *mosaic.add_subcommand(
-      "plan", "Decide on everything and write it down, to be run in parts");
+  CLI::App& command =
+      *mosaic.add_subcommand("plan", "Decide on everything and write it down, to be run in parts");
   const auto parsed = AddMosaicOptions(command);
   command.add_option("-o", parsed->plan, "Plan to write")->type_name("PLAN")->required();
   command.callback([parsed, &command] { WritePlan(Settle(*parsed, command), parsed->plan); });
@@ -215,7 +215,8 @@ void AddRunCommand(CLI::App& mosaic) {
   declare.Add("--tiles", options->tiles, "A-B",
               "Tiles to make, counted from 1, both included; by default all");
   AddWork(declare, command, options->work);
-  command.callback([options] { RunPlan(options->plan, ParseTiles(options->tiles), options->work); });
+  command.callback(
+      [options] { RunPlan(options->plan, ParseTiles(options->tiles), options->work); });
   command.footer(
       "Tiles are written to a folder beside the plan. Those that are there are not made again, so "
       "a piece that was killed is simply run again, and any number of processes may work on a plan "

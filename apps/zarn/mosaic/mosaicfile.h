@@ -29,8 +29,10 @@ class MosaicFile {
   /// Writes a tile that lies at `window.x - left`, `window.y - top` of the file. Tiles of a file
   /// with blocks across tiles come row by row.
   void Write(TileBuffers& tile, std::int64_t left, std::int64_t top);
-  /// `note` is a metadata item KEY=VALUE for the image, or empty.
+  /// Gives the image a metadata item; to be done before the first tile.
   void Annotate(const std::string& key, const std::string& value);
+  /// Whether `Publish` still has a large part of the writing to do.
+  bool CopiesAtTheEnd() const { return image_.CopiesAtTheEnd(); }
   void Publish(nspio::Counter& progress);
 
  private:

@@ -113,9 +113,8 @@ void WriteVrt(const std::string& target, bool overwrite, const std::vector<std::
   CPLErrorReset();
   int failed = FALSE;
   const fs::path place = fs::absolute(target);
-  const DatasetPtr vrt(GDALDataset::FromHandle(
-      GDALBuildVRT(place.c_str(), static_cast<int>(names.size()), nullptr, names.data(), nullptr,
-                   &failed)));
+  const DatasetPtr vrt(GDALDataset::FromHandle(GDALBuildVRT(
+      place.c_str(), static_cast<int>(names.size()), nullptr, names.data(), nullptr, &failed)));
   if (!vrt || failed != FALSE) {
     throw RunError("cannot join the tiles as " + target + ": " + LastGdalMessage());
   }

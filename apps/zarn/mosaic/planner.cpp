@@ -73,8 +73,8 @@ bool Empty(const Window& window) { return window.width <= 0 || window.height <= 
 /// A scene while the grid is not settled yet.
 struct Candidate {
   ScenePlan plan;
-  OutputGrid grid;                ///< that covers it, in the mosaic's coordinate system
-  std::optional<Ground> ground;   ///< where its own grid lies in that system
+  OutputGrid grid;               ///< that covers it, in the mosaic's coordinate system
+  std::optional<Ground> ground;  ///< where its own grid lies in that system
 };
 
 bool IsNorthUp(const OutputGrid& grid) {
@@ -172,7 +172,8 @@ void Planner::CheckOptions() const {
     throw UsageError("--cutline-id needs --cutlines");
   }
   if (!options_.writeCutlines.empty() && !FindsSeams()) {
-    throw UsageError("--write-cutlines: there are no seams to write with --cutlines or --seams none");
+    throw UsageError(
+        "--write-cutlines: there are no seams to write with --cutlines or --seams none");
   }
   if (!options_.reference.empty() && options_.balance == "none" && !options_.hotSpot) {
     throw UsageError("--reference needs --balance or --hotspot, which bring scenes onto it");
@@ -195,11 +196,10 @@ void Planner::OpenScenes() {
     RasterSource source(name);
     source.RefusePalette();
     if (!first_) {
-      RequireSampleType(source,
-                        OnWindows(std::unique_ptr<processes::filters::IFilter>(
-                                      processes::filters::CutlineBlendingFactory({}, 0)
-                                          .GetCPUFilter()),
-                                  {}));
+      RequireSampleType(
+          source, OnWindows(std::unique_ptr<processes::filters::IFilter>(
+                                processes::filters::CutlineBlendingFactory({}, 0).GetCPUFilter()),
+                            {}));
       if (options_.crs.empty()) plan_.grid.crs = SourceLocator(source, nullptr, "").Crs();
     } else {
       RequireSameSamples(*first_, source);
@@ -254,8 +254,9 @@ void Planner::LayGrid() {
   const double height = std::ceil(bottom - kSlack) - top;
   constexpr double kMost = 2147483647;
   if (!(width <= kMost && height <= kMost)) {
-    throw RunError("the mosaic would have more than 2147483647 columns or rows; give a smaller "
-                   "extent with --te or a larger --tr");
+    throw RunError(
+        "the mosaic would have more than 2147483647 columns or rows; give a smaller "
+        "extent with --te or a larger --tr");
   }
   const OGRSpatialReference crs = grid.crs;
   grid = first;
@@ -366,8 +367,7 @@ void Planner::RemoveHotSpots(nspio::Counter& progress) {
     ProgressSpan span(progress, static_cast<double>(done) / count,
                       static_cast<double>(done + 1) / count);
     ++done;
-    const HotSpotEstimate estimate =
-        EstimateHotSpot(sources, options_.srcNoData, kClasses, span);
+    const HotSpotEstimate estimate = EstimateHotSpot(sources, options_.srcNoData, kClasses, span);
     for (const QuadraticFit& fit : estimate.fits) {
       scene.hotSpot.emplace_back(fit.coefficients.begin(), fit.coefficients.end());
     }
@@ -389,9 +389,8 @@ void Planner::BalanceScenes() {
   for (std::size_t i = 0; i < plan_.scenes.size(); ++i) {
     const std::string& file = plan_.scenes[i].File();
     // The first one listed, wherever it is pasted.
-    const bool chosen = options_.reference.empty()
-                            ? file == AbsoluteName(options_.scenes.front())
-                            : file == reference;
+    const bool chosen = options_.reference.empty() ? file == AbsoluteName(options_.scenes.front())
+                                                   : file == reference;
     if (!chosen) continue;
     anchor = i;
     isScene = true;
@@ -421,9 +420,8 @@ void Planner::PlaceSeams(nspio::Counter& progress) {
     views.push_back(ViewOf(survey, i, &plan_.scenes[i]));
   }
   const WindowSize lattice{survey.lattice.width, survey.lattice.height};
-  planning_.labels =
-      FindSeams(views, lattice, {.feather = static_cast<double>(plan_.feather) / survey.step},
-                progress);
+  planning_.labels = FindSeams(
+      views, lattice, {.feather = static_cast<double>(plan_.feather) / survey.step}, progress);
   const std::vector<ScenePolygon> polygons =
       SeamPolygons(planning_.labels, lattice, plan_.scenes.size(), survey.step, 0.75);
   for (std::size_t i = 0; i < plan_.scenes.size(); ++i) {

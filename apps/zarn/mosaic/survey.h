@@ -18,9 +18,9 @@ namespace zarn::app {
 /// A scene on a coarse lattice: one pixel for each cell, the one in its middle.
 struct SurveyedScene {
   std::string name;
-  Window area;                       ///< cells of the lattice
-  std::vector<std::byte> samples;    ///< pixel-interleaved, of the scene's type
-  std::vector<std::uint8_t> valid;   ///< 0: no data
+  Window area;                      ///< cells of the lattice
+  std::vector<std::byte> samples;   ///< pixel-interleaved, of the scene's type
+  std::vector<std::uint8_t> valid;  ///< 0: no data
 };
 
 /// The scenes of a mosaic on one lattice, small enough to be held in memory: what corrections and
