@@ -65,11 +65,13 @@ void AddPlacing(Declarer& declare, MosaicOptions& options) {
   declare
       .Add("--te", options.extent, "XMIN YMIN XMAX YMAX",
            "Extent of OUT in its coordinate system; by default all that the scenes cover")
-      ->expected(4);
+      ->expected(4)
+      ->allow_extra_args(false);
   declare
       .Add("--tr", options.resolution, "WIDTH HEIGHT",
            "Size of the pixels of OUT; by default that of the first scene")
-      ->expected(2);
+      ->expected(2)
+      ->allow_extra_args(false);
   declare.AddChoice("-r,--resampling", options.resampling, {"nearest", "bilinear", "cubic"},
                     "nearest, bilinear or cubic; scenes whose pixels are those of OUT are copied");
   declare

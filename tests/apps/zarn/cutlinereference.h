@@ -16,8 +16,8 @@ using Point = std::pair<double, double>;
 using Ring = std::vector<Point>;
 using Polygon = std::vector<Ring>;
 
-// The map of the tests: pixels of 32 metres. A power of two keeps vertices exact on their way to the
-// map and back.
+// The map of the tests: pixels of 32 metres. A power of two keeps vertices exact on their way to
+// the map and back.
 inline constexpr double kEast = 500000;
 inline constexpr double kNorth = 5100000;
 inline constexpr double kSize = 32;
