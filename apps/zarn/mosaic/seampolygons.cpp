@@ -106,7 +106,9 @@ class BorderTracer {
       : labels_(labels), lattice_(lattice), seen_(CornerCount()) {
     const auto forEachCorner = [&](const auto& visit) {
       for (std::int64_t y = 0; y <= lattice_.height; ++y) {
-        for (std::int64_t x = 0; x <= lattice_.width; ++x) visit(Point{2 * x, 2 * y});
+        for (std::int64_t x = 0; x <= lattice_.width; ++x) {
+          if (!IsWithin(x, y)) visit(Point{2 * x, 2 * y});
+        }
       }
     };
     forEachCorner([&](const Point& corner) {
@@ -154,6 +156,13 @@ class BorderTracer {
   std::uint32_t LabelAt(std::int64_t x, std::int64_t y) const {
     const bool inside = x >= 0 && y >= 0 && x < lattice_.width && y < lattice_.height;
     return inside ? labels_[static_cast<std::size_t>(y * lattice_.width + x)] : kNoLabel;
+  }
+  // Whether all four cells around a corner have the same label, as around most.
+  bool IsWithin(std::int64_t x, std::int64_t y) const {
+    if (x == 0 || y == 0 || x == lattice_.width || y == lattice_.height) return false;
+    const std::uint32_t* const below = labels_.data() + y * lattice_.width + x;
+    const std::uint32_t* const above = below - lattice_.width;
+    return below[-1] == below[0] && above[-1] == below[0] && above[0] == below[0];
   }
   // The label to the right of the edge that leaves `corner`: the cell between this direction and
   // the next one.

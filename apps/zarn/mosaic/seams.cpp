@@ -23,6 +23,10 @@ constexpr double kBesideOther = 32;
 constexpr double kUnit = 256;
 constexpr std::int32_t kNever = 1 << 27;
 
+std::int32_t Rounded(double cost) {
+  return static_cast<std::int32_t>(kUnit * cost + (cost < 0 ? -0.5 : 0.5));
+}
+
 // What a link stands for of the length of a seam, so that seams in any direction cost their length
 // to a few percent (Y. Boykov, V. Kolmogorov: Computing Geodesics and Minimal Surfaces via Graph
 // Cuts, 2003).
@@ -194,11 +198,10 @@ class Insertion {
           if (kinds_[other] != kCommon || !isForward) continue;
           const auto link =
               dy == 0 ? CutProblem::kEast : static_cast<CutProblem::Link>(CutProblem::kSouth + dx);
-          problem.links[cell][link] = static_cast<std::int32_t>(
-              std::lround(kUnit * LengthOf(dx, dy) * (costs[cell] + costs[other]) / 2));
+          problem.links[cell][link] = Rounded(LengthOf(dx, dy) * (costs[cell] + costs[other]) / 2);
         }
       }
-      problem.pull[cell] = static_cast<std::int32_t>(std::lround(kUnit * pull));
+      problem.pull[cell] = Rounded(pull);
     });
     KeepCores(distance, problem);
     return problem;

@@ -25,7 +25,7 @@ struct SeamOptions {
   std::size_t smallestIsland = 8;
   /// Common areas of more cells are solved on coarser cells first and then refined in a band around
   /// that seam.
-  std::size_t exactCells = 1 << 14;
+  std::size_t exactCells = 1 << 13;
 };
 
 /// Which scene (its index) shows in each cell, [row][column] of the lattice.
