@@ -463,7 +463,7 @@ std::vector<std::uint8_t> MinimumCut(const CutProblem& problem, std::size_t exac
   std::vector<std::uint8_t> sides(problem.open.size());
   std::vector<std::uint8_t> free(problem.open);
   const auto openCells = std::count(problem.open.begin(), problem.open.end(), 1);
-  if (static_cast<std::size_t>(openCells) > exactCells) {
+  if (static_cast<std::size_t>(openCells) > std::max<std::size_t>(exactCells, 1)) {
     const CoarserProblem coarser(problem);
     const std::vector<std::uint8_t> coarse = MinimumCut(coarser.problem, exactCells);
     std::vector<std::uint8_t> near(coarser.torn);

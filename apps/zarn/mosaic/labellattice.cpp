@@ -221,6 +221,7 @@ std::vector<std::uint32_t> Around(const std::vector<std::size_t>& island,
   std::stable_sort(sorted.begin(), sorted.end(),
                    [](const auto& a, const auto& b) { return a.second > b.second; });
   std::vector<std::uint32_t> around;
+  around.reserve(sorted.size());
   for (const auto& [label, border] : sorted) around.push_back(label);
   return around;
 }

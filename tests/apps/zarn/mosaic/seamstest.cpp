@@ -227,6 +227,24 @@ TEST(FindSeams, ShowsDataWhereverThereIsSome) {
   }
 }
 
+TEST(FindSeams, LetsNoneOfThreeNestedScenesVanish) {
+  const WindowSize lattice{40, 40};
+  const auto noise = [](std::int64_t x, std::int64_t y) {
+    return static_cast<double>((x * 131 + y * 71) % 17);
+  };
+  const std::vector<Window> areas{{2, 2, 36, 36}, {10, 10, 20, 20}, {14, 14, 12, 12}};
+  std::vector<std::size_t> order{0, 1, 2};
+  do {
+    std::vector<SceneView> scenes;
+    for (const std::size_t i : order) scenes.push_back(Block(areas[i], noise));
+    const Labels labels = Find(scenes, lattice);
+    for (std::uint32_t label = 0; label < 3; ++label) {
+      EXPECT_GE(std::count(labels.begin(), labels.end(), label), 20)
+          << order[0] << order[1] << label;
+    }
+  } while (std::next_permutation(order.begin(), order.end()));
+}
+
 TEST(FillFromNearest, FindsTheNearestLabelAndTheLowerOfTwo) {
   std::mt19937 random(5);
   for (int run = 0; run < 40; ++run) {
