@@ -104,6 +104,7 @@ OGRLayer& CreateLayer(GDALDataset& dataset, const OutputGrid& grid, const std::s
 void WriteCutlines(const std::string& target, bool overwrite, const OutputGrid& grid,
                    const std::vector<std::string>& sceneNames,
                    const std::vector<ScenePolygon>& polygons) {
+  RefuseReplacingInputs(target, {target});
   StagingFolder staging(target, overwrite);
   const std::string name = staging.Target().string();
   RenameInMessages(staging.StagedFile().string(), name);
@@ -122,7 +123,6 @@ void WriteCutlines(const std::string& target, bool overwrite, const OutputGrid& 
   }
   if (dataset->CommitTransaction() != OGRERR_NONE) FailWriting(name, LastGdalMessage(name));
   CloseChecked(std::move(dataset), name);
-  RefuseReplacingInputs(staging.Target(), staging.FilesToPublish());
   staging.Publish();
 }
 

@@ -356,33 +356,52 @@ class Network {
   std::size_t lower_ = 0;
 };
 
-// Visits every link that costs something, with the two cells and the cost.
+constexpr std::array<std::int64_t, CutProblem::kLinks> kLinkX{1, -1, 0, 1};
+constexpr std::array<std::int64_t, CutProblem::kLinks> kLinkY{0, 1, 1, 1};
+
+// Visits every link that costs something, with the cell that holds it.
 template <typename Visit>
 void ForEachLink(const CutProblem& problem, const Visit& visit) {
-  const auto width = static_cast<std::size_t>(problem.size.width);
-  const std::array<std::size_t, CutProblem::kLinks> steps{1, width - 1, width, width + 1};
-  for (std::size_t cell = 0; cell < problem.open.size(); ++cell) {
-    if (problem.open[cell] == 0) continue;
-    for (std::size_t link = 0; link < CutProblem::kLinks; ++link) {
-      const std::int32_t cost = problem.links[cell][link];
-      if (cost != 0) visit(cell, cell + steps[link], cost);
+  std::size_t cell = 0;
+  for (std::int64_t y = 0; y < problem.size.height; ++y) {
+    for (std::int64_t x = 0; x < problem.size.width; ++x, ++cell) {
+      if (problem.open[cell] == 0) continue;
+      for (std::size_t link = 0; link < CutProblem::kLinks; ++link) {
+        const std::int32_t cost = problem.links[cell][link];
+        if (cost != 0) visit(x, y, link, cost);
+      }
     }
   }
+}
+
+std::size_t CellAt(WindowSize size, std::int64_t x, std::int64_t y) {
+  return static_cast<std::size_t>(y * size.width + x);
+}
+
+// The other end of a link.
+std::size_t CellBeyond(WindowSize size, std::int64_t x, std::int64_t y, std::size_t link) {
+  return CellAt(size, x + kLinkX[link], y + kLinkY[link]);
 }
 
 /// A problem in which squares of 2 x 2 cells stay together.
 struct CoarserProblem {
   explicit CoarserProblem(const CutProblem& fine);
 
-  std::size_t SquareOf(std::size_t cell) const {
-    const auto width = static_cast<std::size_t>(fineSize.width);
-    return cell / width / 2 * static_cast<std::size_t>(problem.size.width) + cell % width / 2;
+  std::size_t SquareOf(std::int64_t x, std::int64_t y) const {
+    return CellAt(problem.size, x / 2, y / 2);
   }
 
-  WindowSize fineSize;
   CutProblem problem;
   std::vector<std::uint8_t> torn;  ///< squares some of whose cells are pulled to either side
 };
+
+template <typename Visit>
+void ForEachCell(WindowSize size, const Visit& visit) {
+  std::size_t cell = 0;
+  for (std::int64_t y = 0; y < size.height; ++y) {
+    for (std::int64_t x = 0; x < size.width; ++x) visit(cell++, x, y);
+  }
+}
 
 std::int32_t Added(std::int32_t a, std::int32_t b) {
   const std::int64_t sum = static_cast<std::int64_t>(a) + b;
@@ -390,13 +409,11 @@ std::int32_t Added(std::int32_t a, std::int32_t b) {
 }
 
 CoarserProblem::CoarserProblem(const CutProblem& fine)
-    : fineSize(fine.size),
-      problem({(fine.size.width + 1) / 2, (fine.size.height + 1) / 2}),
-      torn(problem.open.size()) {
+    : problem({(fine.size.width + 1) / 2, (fine.size.height + 1) / 2}), torn(problem.open.size()) {
   std::vector<std::uint8_t> pulls(torn.size());
-  for (std::size_t cell = 0; cell < fine.open.size(); ++cell) {
-    if (fine.open[cell] == 0) continue;
-    const std::size_t square = SquareOf(cell);
+  ForEachCell(fine.size, [&](std::size_t cell, std::int64_t x, std::int64_t y) {
+    if (fine.open[cell] == 0) return;
+    const std::size_t square = SquareOf(x, y);
     problem.open[square] = 1;
     problem.pull[square] = Added(problem.pull[square], fine.pull[cell]);
     constexpr std::uint8_t kToFirst = 1;
@@ -404,18 +421,16 @@ CoarserProblem::CoarserProblem(const CutProblem& fine)
     if (fine.pull[cell] > 0) pulls[square] |= kToFirst;
     if (fine.pull[cell] < 0) pulls[square] |= kToSecond;
     torn[square] = pulls[square] == (kToFirst | kToSecond) ? 1 : 0;
-  }
-  const auto width = static_cast<std::size_t>(problem.size.width);
-  ForEachLink(fine, [&](std::size_t from, std::size_t to, std::int32_t cost) {
-    const std::size_t a = std::min(SquareOf(from), SquareOf(to));
-    const std::size_t b = std::max(SquareOf(from), SquareOf(to));
-    if (a == b) return;
-    // By the columns, as squares of a narrow problem are apart by the same number in two ways.
-    const std::size_t link = a / width == b / width       ? CutProblem::kEast
-                             : b % width == a % width     ? CutProblem::kSouth
-                             : b % width == a % width + 1 ? CutProblem::kSouthEast
-                                                          : CutProblem::kSouthWest;
-    problem.links[a][link] = Added(problem.links[a][link], cost);
+  });
+  ForEachLink(fine, [&](std::int64_t x, std::int64_t y, std::size_t link, std::int32_t cost) {
+    const std::int64_t across = (x + kLinkX[link]) / 2 - x / 2;
+    const std::int64_t down = (y + kLinkY[link]) / 2 - y / 2;
+    if (across == 0 && down == 0) return;
+    const std::size_t here = SquareOf(x, y);
+    const std::size_t holder = down == 0 && across < 0 ? here - 1 : here;
+    const auto way = down == 0 ? CutProblem::kEast : CutProblem::kSouth + across;
+    std::int32_t& sum = problem.links[holder][static_cast<std::size_t>(way)];
+    sum = Added(sum, cost);
   });
 }
 
@@ -448,20 +463,24 @@ std::vector<std::uint8_t> MinimumCut(const CutProblem& problem, std::size_t exac
   std::vector<std::uint8_t> sides(problem.open.size());
   std::vector<std::uint8_t> free(problem.open);
   const auto openCells = std::count(problem.open.begin(), problem.open.end(), 1);
-  if (static_cast<std::size_t>(openCells) > exactCells) {
+  if (static_cast<std::size_t>(openCells) > std::max<std::size_t>(exactCells, 1)) {
     const CoarserProblem coarser(problem);
     const std::vector<std::uint8_t> coarse = MinimumCut(coarser.problem, exactCells);
     std::vector<std::uint8_t> near(coarser.torn);
-    ForEachLink(coarser.problem, [&](std::size_t a, std::size_t b, std::int32_t) {
-      if (coarse[a] != coarse[b]) near[a] = near[b] = 1;
-    });
+    const WindowSize squares = coarser.problem.size;
+    ForEachLink(coarser.problem,
+                [&](std::int64_t x, std::int64_t y, std::size_t link, std::int32_t) {
+                  const std::size_t a = CellAt(squares, x, y);
+                  const std::size_t b = CellBeyond(squares, x, y, link);
+                  if (coarse[a] != coarse[b]) near[a] = near[b] = 1;
+                });
     constexpr int kSquaresBeside = 3;
-    Widen(near, coarser.problem.size, kSquaresBeside);
-    for (std::size_t cell = 0; cell < sides.size(); ++cell) {
-      const std::size_t square = coarser.SquareOf(cell);
+    Widen(near, squares, kSquaresBeside);
+    ForEachCell(problem.size, [&](std::size_t cell, std::int64_t x, std::int64_t y) {
+      const std::size_t square = coarser.SquareOf(x, y);
       sides[cell] = problem.open[cell] != 0 ? coarse[square] : 0;
       if (near[square] == 0) free[cell] = 0;
-    }
+    });
   }
   Network(problem, free, sides).Solve(sides);
   return sides;
@@ -469,8 +488,8 @@ std::vector<std::uint8_t> MinimumCut(const CutProblem& problem, std::size_t exac
 
 std::int64_t CutCost(const CutProblem& problem, const std::vector<std::uint8_t>& sides) {
   std::int64_t cost = 0;
-  ForEachLink(problem, [&](std::size_t a, std::size_t b, std::int32_t c) {
-    if (sides[a] != sides[b]) cost += c;
+  ForEachLink(problem, [&](std::int64_t x, std::int64_t y, std::size_t link, std::int32_t c) {
+    if (sides[CellAt(problem.size, x, y)] != sides[CellBeyond(problem.size, x, y, link)]) cost += c;
   });
   for (std::size_t cell = 0; cell < sides.size(); ++cell) {
     if (problem.open[cell] == 0) continue;

@@ -153,36 +153,93 @@ void FillFromNearest(std::vector<std::uint32_t>& labels, WindowSize lattice) {
   }
 }
 
+namespace {
+
+/// Looks for islands by flooding no more than `smallest` cells from each cell. Most cells are known
+/// to be no part of one because the cell before or above is not.
+class IslandSearch {
+ public:
+  IslandSearch(std::vector<std::uint32_t>& labels, WindowSize lattice, std::size_t smallest)
+      : labels_(labels), lattice_(lattice), smallest_(smallest), state_(labels.size()) {}
+
+  // The cells of the island that begins at `start`; empty where there is none.
+  const std::vector<std::size_t>& At(std::size_t start) {
+    island_.clear();
+    const auto width = static_cast<std::size_t>(lattice_.width);
+    const auto continues = [&](std::size_t before) {
+      return state_[before] == kMainland && labels_[before] == labels_[start];
+    };
+    if (state_[start] == kKnownIsland) return island_;
+    if (state_[start] == kMainland || (start >= width && continues(start - width)) ||
+        (start % width > 0 && continues(start - 1))) {
+      state_[start] = kMainland;
+      return island_;
+    }
+    const bool isIsland = Flood(start);
+    for (const std::size_t cell : island_) state_[cell] = isIsland ? kKnownIsland : kMainland;
+    if (!isIsland) island_.clear();
+    return island_;
+  }
+
+ private:
+  enum State : std::uint8_t { kUnknown, kMainland, kKnownIsland, kFlooded };
+
+  bool Flood(std::size_t start) {
+    island_.push_back(start);
+    state_[start] = kFlooded;
+    bool isIsland = true;
+    for (std::size_t i = 0; i < island_.size() && isIsland; ++i) {
+      ForEachSide(island_[i], lattice_, [&](std::size_t other) {
+        if (labels_[other] != labels_[start] || state_[other] == kFlooded) return;
+        if (state_[other] == kMainland) isIsland = false;
+        if (state_[other] != kUnknown) return;
+        state_[other] = kFlooded;
+        island_.push_back(other);
+      });
+      isIsland = isIsland && island_.size() < smallest_;
+    }
+    return isIsland;
+  }
+
+  std::vector<std::uint32_t>& labels_;
+  WindowSize lattice_;
+  std::size_t smallest_;
+  std::vector<State> state_;
+  std::vector<std::size_t> island_;
+};
+
+// The labels around an island, that with the longest common border first.
+std::vector<std::uint32_t> Around(const std::vector<std::size_t>& island,
+                                  const std::vector<std::uint32_t>& labels, WindowSize lattice) {
+  std::map<std::uint32_t, std::size_t> borders;
+  for (const std::size_t cell : island) {
+    ForEachSide(cell, lattice, [&](std::size_t other) {
+      if (labels[other] != labels[cell]) ++borders[labels[other]];
+    });
+  }
+  std::vector<std::pair<std::uint32_t, std::size_t>> sorted(borders.begin(), borders.end());
+  std::stable_sort(sorted.begin(), sorted.end(),
+                   [](const auto& a, const auto& b) { return a.second > b.second; });
+  std::vector<std::uint32_t> around;
+  around.reserve(sorted.size());
+  for (const auto& [label, border] : sorted) around.push_back(label);
+  return around;
+}
+
+}  // namespace
+
 void MergeIslands(std::vector<std::uint32_t>& labels, WindowSize lattice, std::size_t smallest,
                   const std::function<bool(std::size_t, std::uint32_t)>& canTake) {
-  std::vector<std::size_t> island;
   // An island that was merged may itself be part of one.
   constexpr int kMostRounds = 8;
   bool changed = smallest > 1;
   for (int round = 0; changed && round < kMostRounds; ++round) {
     changed = false;
-    std::vector<std::uint8_t> seen(labels.size());
+    IslandSearch search(labels, lattice, smallest);
     for (std::size_t start = 0; start < labels.size(); ++start) {
-      if (seen[start] != 0) continue;
-      const std::uint32_t label = labels[start];
-      island.assign(1, start);
-      seen[start] = 1;
-      std::map<std::uint32_t, std::size_t> borders;
-      for (std::size_t i = 0; i < island.size(); ++i) {
-        ForEachSide(island[i], lattice, [&](std::size_t other) {
-          if (labels[other] != label) {
-            if (island.size() < smallest) ++borders[labels[other]];
-          } else if (seen[other] == 0) {
-            seen[other] = 1;
-            island.push_back(other);
-          }
-        });
-      }
-      if (island.size() >= smallest) continue;
-      std::vector<std::pair<std::uint32_t, std::size_t>> takers(borders.begin(), borders.end());
-      std::stable_sort(takers.begin(), takers.end(),
-                       [](const auto& a, const auto& b) { return a.second > b.second; });
-      for (const auto& [taker, border] : takers) {
+      const std::vector<std::size_t>& island = search.At(start);
+      if (island.empty()) continue;
+      for (const std::uint32_t taker : Around(island, labels, lattice)) {
         const bool takesAll = std::all_of(island.begin(), island.end(),
                                           [&](std::size_t cell) { return canTake(cell, taker); });
         if (!takesAll) continue;

@@ -106,7 +106,9 @@ class BorderTracer {
       : labels_(labels), lattice_(lattice), seen_(CornerCount()) {
     const auto forEachCorner = [&](const auto& visit) {
       for (std::int64_t y = 0; y <= lattice_.height; ++y) {
-        for (std::int64_t x = 0; x <= lattice_.width; ++x) visit(Point{2 * x, 2 * y});
+        for (std::int64_t x = 0; x <= lattice_.width; ++x) {
+          if (!IsWithin(x, y)) visit(Point{2 * x, 2 * y});
+        }
       }
     };
     forEachCorner([&](const Point& corner) {
@@ -154,6 +156,13 @@ class BorderTracer {
   std::uint32_t LabelAt(std::int64_t x, std::int64_t y) const {
     const bool inside = x >= 0 && y >= 0 && x < lattice_.width && y < lattice_.height;
     return inside ? labels_[static_cast<std::size_t>(y * lattice_.width + x)] : kNoLabel;
+  }
+  // Whether all four cells around a corner have the same label, as around most.
+  bool IsWithin(std::int64_t x, std::int64_t y) const {
+    if (x == 0 || y == 0 || x == lattice_.width || y == lattice_.height) return false;
+    const std::uint32_t* const below = labels_.data() + y * lattice_.width + x;
+    const std::uint32_t* const above = below - lattice_.width;
+    return below[-1] == below[0] && above[-1] == below[0] && above[0] == below[0];
   }
   // The label to the right of the edge that leaves `corner`: the cell between this direction and
   // the next one.
@@ -256,7 +265,7 @@ class EdgeIndex {
     std::sort(entries_.begin(), entries_.end());
   }
 
-  // All edges that meet another one elsewhere than in a common end.
+  // The edges that meet another one elsewhere than in a common end; some several times.
   std::vector<Edge> Meeting() const {
     std::vector<Edge> meeting;
     for (std::size_t i = 0; i < entries_.size(); ++i) {
@@ -269,8 +278,6 @@ class EdgeIndex {
         meeting.push_back(b);
       }
     }
-    std::sort(meeting.begin(), meeting.end());
-    meeting.erase(std::unique(meeting.begin(), meeting.end()), meeting.end());
     return meeting;
   }
 
@@ -306,14 +313,79 @@ class EdgeIndex {
   std::vector<std::pair<std::pair<std::int64_t, std::int64_t>, Edge>> entries_;
 };
 
-// Puts vertices back until no two edges meet. With all of them none do: each corner of the lattice
-// has the borders through it within half a cell of itself.
+// How often the closed way along `points[from..to]` and straight back runs around `p`.
+int Turns(const std::vector<Point>& points, std::size_t from, std::size_t to, const Point& p) {
+  int turns = 0;
+  for (std::size_t i = from; i <= to; ++i) {
+    const Point& a = points[i];
+    const Point& b = points[i < to ? i + 1 : from];
+    if (a.y <= p.y && b.y > p.y && Cross(a, b, p) > 0) ++turns;
+    if (a.y > p.y && b.y <= p.y && Cross(a, b, p) < 0) --turns;
+  }
+  return turns;
+}
+
+/// The ends of arcs and one point of each ring, which all stay where they are. As long as no edge
+/// has passed one of them, and none meets another, every area lies among its neighbours as before.
+class FixedPoints {
+ public:
+  explicit FixedPoints(const std::vector<Arc>& arcs) : arcs_(arcs) {
+    for (const Arc& arc : arcs) {
+      points_.insert(points_.end(), {Swapped(arc.points.front()), Swapped(arc.points.back())});
+    }
+    std::sort(points_.begin(), points_.end());
+    points_.erase(std::unique(points_.begin(), points_.end()), points_.end());
+  }
+
+  // The edges that lie on another side of such a point than the border that they stand for.
+  std::vector<Edge> PassedBy() const {
+    std::vector<Edge> edges;
+    for (std::size_t a = 0; a < arcs_.size(); ++a) {
+      for (std::size_t v = 0; v + 1 < arcs_[a].kept.size(); ++v) {
+        if (HasPassed(arcs_[a], arcs_[a].kept[v], arcs_[a].kept[v + 1])) edges.push_back({a, v});
+      }
+    }
+    return edges;
+  }
+
+ private:
+  static Point Swapped(const Point& p) { return {p.y, p.x}; }
+
+  bool HasPassed(const Arc& arc, std::size_t from, std::size_t to) const {
+    if (to == from + 1) return false;
+    Point low = arc.points[from];
+    Point high = low;
+    for (std::size_t i = from; i <= to; ++i) {
+      const Point& p = arc.points[i];
+      low = {std::min(low.x, p.x), std::min(low.y, p.y)};
+      high = {std::max(high.x, p.x), std::max(high.y, p.y)};
+    }
+    auto row = std::lower_bound(points_.begin(), points_.end(), Swapped(low));
+    for (; row != points_.end() && row->x <= high.y; ++row) {
+      const Point p = Swapped(*row);
+      if (p.x < low.x || p.x > high.x || p == arc.points[from] || p == arc.points[to]) continue;
+      if (Turns(arc.points, from, to, p) != 0) return true;
+    }
+    return false;
+  }
+
+  const std::vector<Arc>& arcs_;
+  std::vector<Point> points_;  ///< x and y swapped, so that they are sorted by rows
+};
+
+// Puts vertices back until no border meets another one or has passed one by. With all of them none
+// does: each corner of the lattice has the borders through it within half a cell of itself.
 void KeepApart(std::vector<Arc>& arcs) {
+  const FixedPoints fixed(arcs);
   while (true) {
-    const std::vector<Edge> meeting = EdgeIndex(arcs).Meeting();
+    std::vector<Edge> wrong = EdgeIndex(arcs).Meeting();
+    const std::vector<Edge> passed = fixed.PassedBy();
+    wrong.insert(wrong.end(), passed.begin(), passed.end());
+    std::sort(wrong.begin(), wrong.end());
+    wrong.erase(std::unique(wrong.begin(), wrong.end()), wrong.end());
     bool changed = false;
     // From the back, so that the vertices before keep their numbers.
-    for (auto edge = meeting.rbegin(); edge != meeting.rend(); ++edge) {
+    for (auto edge = wrong.rbegin(); edge != wrong.rend(); ++edge) {
       Arc& arc = arcs[edge->arc];
       const std::size_t from = arc.kept[edge->vertex];
       const auto [middle, square] = arc.Farthest(from, arc.kept[edge->vertex + 1]);
@@ -370,10 +442,8 @@ double RingArea(const std::vector<std::array<double, 2>>& ring) {
 
 std::vector<ScenePolygon> SeamPolygons(const std::vector<std::uint32_t>& labels, WindowSize lattice,
                                        std::size_t count, double cell, double tolerance) {
-  // Where one area lies between two others it is wider than this, so that no border can pass it.
-  constexpr double kMostTolerance = 0.75;
   BorderTracer borders(labels, lattice);
-  for (Arc& arc : borders.Arcs()) arc.Simplify(std::clamp(tolerance, 0.0, kMostTolerance));
+  for (Arc& arc : borders.Arcs()) arc.Simplify(tolerance);
   KeepApart(borders.Arcs());
 
   std::vector<ScenePolygon> polygons(count);

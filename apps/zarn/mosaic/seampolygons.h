@@ -28,11 +28,12 @@ double RingArea(const std::vector<std::array<double, 2>>& ring);
 /// `cell` is the size of a cell in pixels.
 ///
 /// Borders run through the middles of the edges of cells, which cuts the corners of stairs; then
-/// vertices are left out where the border moves by no more than `tolerance` cells, at most 3/4 (D.
-/// Douglas, T. Peucker: Algorithms for the Reduction of the Number of Points Required to Represent
-/// a Digitized Line or its Caricature, 1973), and put back where borders would meet. Points where
-/// three areas meet or a border ends at the frame stay where they are. With a tolerance of 0 the
-/// centre of every cell lies in the polygon of its label.
+/// vertices are left out where the border moves by no more than `tolerance` cells (D. Douglas, T.
+/// Peucker: Algorithms for the Reduction of the Number of Points Required to Represent a Digitized
+/// Line or its Caricature, 1973), and put back where borders would meet or pass each other. Points
+/// where three areas meet or a border ends at the frame stay where they are. With a tolerance of 0
+/// the centre of every cell lies in the polygon of its label; with 1 to 2 there is a vertex every
+/// few cells of a ragged seam.
 std::vector<ScenePolygon> SeamPolygons(const std::vector<std::uint32_t>& labels, WindowSize lattice,
                                        std::size_t count, double cell, double tolerance);
 

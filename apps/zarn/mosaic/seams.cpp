@@ -23,6 +23,10 @@ constexpr double kBesideOther = 32;
 constexpr double kUnit = 256;
 constexpr std::int32_t kNever = 1 << 27;
 
+std::int32_t Rounded(double cost) {
+  return static_cast<std::int32_t>(kUnit * cost + (cost < 0 ? -0.5 : 0.5));
+}
+
 // What a link stands for of the length of a seam, so that seams in any direction cost their length
 // to a few percent (Y. Boykov, V. Kolmogorov: Computing Geodesics and Minimal Surfaces via Graph
 // Cuts, 2003).
@@ -194,11 +198,10 @@ class Insertion {
           if (kinds_[other] != kCommon || !isForward) continue;
           const auto link =
               dy == 0 ? CutProblem::kEast : static_cast<CutProblem::Link>(CutProblem::kSouth + dx);
-          problem.links[cell][link] = static_cast<std::int32_t>(
-              std::lround(kUnit * LengthOf(dx, dy) * (costs[cell] + costs[other]) / 2));
+          problem.links[cell][link] = Rounded(LengthOf(dx, dy) * (costs[cell] + costs[other]) / 2);
         }
       }
-      problem.pull[cell] = static_cast<std::int32_t>(std::lround(kUnit * pull));
+      problem.pull[cell] = Rounded(pull);
     });
     KeepCores(distance, problem);
     return problem;
@@ -208,7 +211,7 @@ class Insertion {
   static bool IsHardly(std::size_t part, std::size_t cells) { return 100 * part < cells; }
 
   void KeepCores(const std::vector<std::int32_t>& distance, CutProblem& problem) const {
-    if (IsHardly(own_, own_ + common_)) {
+    if (IsHardly(own_, own_ + common_) && !HasTwin()) {
       const std::int32_t most = *std::max_element(distance.begin(), distance.end());
       for (std::size_t i = 0; i < kinds_.size(); ++i) {
         if (kinds_[i] == kCommon && 2 * distance[i] >= most) problem.pull[i] = -kNever;
@@ -223,16 +226,40 @@ class Insertion {
     }
   }
 
+  // Whether an earlier scene has the same area, but for next to nothing.
+  bool HasTwin() const {
+    const std::size_t cells = own_ + common_;
+    return std::any_of(scenes_.begin(), scenes_.begin() + index_, [&](const SceneView& other) {
+      const auto ofOther = static_cast<std::size_t>(
+          std::count_if(other.valid.begin(), other.valid.end(), [](auto valid) { return valid; }));
+      std::size_t shared = 0;
+      ForEachCell([&](std::size_t, std::int64_t x, std::int64_t y) {
+        if (IsValid(scene_, x, y) && IsValid(other, x, y)) ++shared;
+      });
+      return IsHardly(cells + ofOther - 2 * shared, cells);
+    });
+  }
+
   void KeepCore(std::uint32_t label, CutProblem& problem) const {
     std::vector<std::uint8_t> part(kinds_.size());
     ForEachCell([&](std::size_t cell, std::int64_t x, std::int64_t y) {
       part[cell] = kinds_[cell] == kCommon && LabelAt(x, y) == label ? 1 : 0;
     });
     const auto distance = DistanceToUnmarked(part, {window_.width, window_.height});
-    const std::int32_t most = *std::max_element(distance.begin(), distance.end());
-    for (std::size_t i = 0; i < part.size(); ++i) {
-      if (part[i] != 0 && 2 * distance[i] >= most) problem.pull[i] = kNever;
-    }
+    const std::int32_t half = *std::max_element(distance.begin(), distance.end()) / 2;
+    const auto keep = [&](std::int32_t least, bool evenOfNewCore) {
+      bool keepsSome = false;
+      for (std::size_t i = 0; i < part.size(); ++i) {
+        if (part[i] == 0 || distance[i] < least) continue;
+        if (problem.pull[i] == -kNever && !evenOfNewCore) continue;
+        problem.pull[i] = kNever;
+        keepsSome = true;
+      }
+      return keepsSome;
+    };
+    // What the core of the new scene leaves of this one, or of all the part. Where it leaves
+    // nothing, this one is the smaller, and the new scene has room around it.
+    if (!keep(half, false) && !keep(0, false)) keep(half, true);
   }
 
   const std::vector<SceneView>& scenes_;

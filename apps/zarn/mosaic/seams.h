@@ -25,7 +25,7 @@ struct SeamOptions {
   std::size_t smallestIsland = 8;
   /// Common areas of more cells are solved on coarser cells first and then refined in a band around
   /// that seam.
-  std::size_t exactCells = 1 << 14;
+  std::size_t exactCells = 1 << 13;
 };
 
 /// Which scene (its index) shows in each cell, [row][column] of the lattice.
@@ -40,10 +40,11 @@ struct SeamOptions {
 /// A cell of the common area does not pass to one scene right beside a cell in which only the
 /// other is valid, unless all else is dearer.
 ///
-/// No scene vanishes because others cover its ground: a new scene with nothing (or next to nothing)
-/// of its own gets the core of its area (the cells that are at least half as far from its edge as
-/// the innermost one), and a scene whose part lies wholly within the new one's area keeps the core
-/// of that part. Scenes of the same area have no seam; the first one shows.
+/// No scene vanishes because others cover its ground: a new scene with nothing (less than a
+/// hundredth) of its own gets the core of its area, the cells that are at least half as far from
+/// its edge as the innermost one; and a scene whose part lies wholly within the new one's area
+/// keeps the core of that part (beside the new one's core, unless it lies wholly within that). But
+/// a scene with the area of an earlier one gets nothing, as the least visible seam is none.
 ///
 /// Cells in which no scene is valid get the scene that shows in the nearest cell with data, so that
 /// an area ends well outside the data. Ties go to the lower index. Without any data all cells are
