@@ -11,6 +11,7 @@
 
 #include "apps/zarn/average.h"
 #include "apps/zarn/blend.h"
+#include "apps/zarn/compare.h"
 #include "apps/zarn/dodge.h"
 #include "apps/zarn/enhance.h"
 #include "apps/zarn/errors.h"
@@ -60,6 +61,7 @@ void AddCommands(CLI::App& app) {
   zarn::app::AddAverageCommand(app);
   zarn::app::AddEnhanceCommand(app);
   zarn::app::AddBlendCommand(app);
+  zarn::app::AddCompareCommand(app);
   zarn::app::AddFitDodgingCommand(app);
   zarn::app::AddFitGainOffsetCommand(app);
   zarn::app::AddFitHotSpotCommand(app);

@@ -30,7 +30,7 @@ namespace {
 // Kinds of land cover that a hot spot is told apart from.
 constexpr std::size_t kClasses = 20;
 
-// Beyond the data nothing is to be decided, so a few pixels of the cutline's surroundings do.
+// How far from its cutline a scene may fill gaps, in cells of the survey.
 constexpr std::int64_t kGapReach = 16;
 
 BalanceKind KindOf(const std::string& name) {
@@ -423,7 +423,7 @@ void Planner::PlaceSeams(nspio::Counter& progress) {
   planning_.labels = FindSeams(
       views, lattice, {.feather = static_cast<double>(plan_.feather) / survey.step}, progress);
   const std::vector<ScenePolygon> polygons =
-      SeamPolygons(planning_.labels, lattice, plan_.scenes.size(), survey.step, 0.75);
+      SeamPolygons(planning_.labels, lattice, plan_.scenes.size(), survey.step, 1);
   for (std::size_t i = 0; i < plan_.scenes.size(); ++i) {
     Polygon& cutline = plan_.scenes[i].cutline;
     for (const auto& ring : polygons[i].rings) {
@@ -438,6 +438,8 @@ void Planner::PlaceSeams(nspio::Counter& progress) {
 }
 
 void Planner::SettleReach() {
+  // Seams are as exact as the lattice on which they were found, also when they are given back.
+  const std::int64_t gap = plan_.fillsGaps ? kGapReach * LaySurvey(plan_.grid, *first_).step : 0;
   for (ScenePlan& scene : plan_.scenes) {
     if (scene.cutline.Empty()) {
       // A seam may have left nothing of a scene.
@@ -458,9 +460,7 @@ void Planner::SettleReach() {
     const auto held = [](double value) {
       return static_cast<std::int64_t>(std::clamp(value, -1e9, 3e9));
     };
-    const std::int64_t margin =
-        std::int64_t{plan_.feather} + 1 +
-        (plan_.fillsGaps && planning_.survey ? kGapReach * planning_.survey->step : 0);
+    const std::int64_t margin = std::int64_t{plan_.feather} + 1 + gap;
     const Window around{held(std::floor(left)) - margin, held(std::floor(top)) - margin,
                         held(std::ceil(right)) - held(std::floor(left)) + 2 * margin,
                         held(std::ceil(bottom)) - held(std::floor(top)) + 2 * margin};

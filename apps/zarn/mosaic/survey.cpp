@@ -27,13 +27,13 @@ constexpr double kThreshold = 0.5;
 std::int64_t DivideUp(std::int64_t a, std::int64_t b) { return (a + b - 1) / b; }
 
 SurveyedScene SurveyScene(const ScenePlan& scene, const Survey& survey, const WorkOptions& work) {
-  SceneFeed feed(scene,
-                 {.grid = survey.lattice,
-                  .resampling = "nearest",
-                  .threshold = kThreshold,
-                  .filter = {},
-                  .mostSourcePixels = MostSourcePixels(survey.channels * survey.type.Bytes(), work),
-                  .isMosaic = false});
+  FeedRequest request;
+  request.grid = survey.lattice;
+  request.resampling = "nearest";
+  request.threshold = kThreshold;
+  request.mostSourcePixels = MostSourcePixels(survey.channels * survey.type.Bytes(), work);
+  request.isMosaic = false;
+  SceneFeed feed(scene, request);
   SurveyedScene result{scene.File(), CellsOf(survey, scene.covers), {}, {}};
   GridMover::Slot slot;
   feed.Read(result.area, slot);
