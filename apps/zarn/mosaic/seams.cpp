@@ -275,6 +275,42 @@ class Insertion {
   std::size_t own_ = 0;
 };
 
+/// The seam between two scenes.
+struct Seam {
+  std::int64_t length = 0;
+  std::vector<std::int64_t> cells;  ///< within 2 of it, in the order of rows
+};
+using Seams = std::map<std::pair<std::uint32_t, std::uint32_t>, Seam>;
+
+Seams TraceSeams(const std::vector<std::uint32_t>& labels, WindowSize lattice) {
+  Seams seams;
+  const Window all{0, 0, lattice.width, lattice.height};
+  const auto cross = [&](std::int64_t x, std::int64_t y, std::int64_t dx, std::int64_t dy) {
+    if (!IsIn(all, x + dx, y + dy)) return;
+    const std::uint32_t a = labels[CellIn(all, x, y)];
+    const std::uint32_t b = labels[CellIn(all, x + dx, y + dy)];
+    if (a == b) return;
+    Seam& seam = seams[std::minmax(a, b)];
+    ++seam.length;
+    for (std::int64_t i = -1; i <= 2; ++i) {
+      const std::int64_t cellX = x + i * dx;
+      const std::int64_t cellY = y + i * dy;
+      if (IsIn(all, cellX, cellY)) seam.cells.push_back(cellY * lattice.width + cellX);
+    }
+  };
+  for (std::int64_t y = 0; y < lattice.height; ++y) {
+    for (std::int64_t x = 0; x < lattice.width; ++x) {
+      cross(x, y, 1, 0);
+      cross(x, y, 0, 1);
+    }
+  }
+  for (auto& [pair, seam] : seams) {
+    std::sort(seam.cells.begin(), seam.cells.end());
+    seam.cells.erase(std::unique(seam.cells.begin(), seam.cells.end()), seam.cells.end());
+  }
+  return seams;
+}
+
 }  // namespace
 
 std::vector<std::uint32_t> FindSeams(const std::vector<SceneView>& scenes, WindowSize lattice,
@@ -300,40 +336,13 @@ std::vector<std::uint32_t> FindSeams(const std::vector<SceneView>& scenes, Windo
 
 std::vector<SeamResidual> SeamResiduals(const std::vector<std::uint32_t>& labels,
                                         WindowSize lattice, const std::vector<SceneView>& scenes) {
-  struct Seam {
-    std::int64_t length = 0;
-    std::vector<std::int64_t> cells;  // again and again
-  };
-  std::map<std::pair<std::uint32_t, std::uint32_t>, Seam> seams;
-  const Window all{0, 0, lattice.width, lattice.height};
-  const auto cross = [&](std::int64_t x, std::int64_t y, std::int64_t dx, std::int64_t dy) {
-    if (!IsIn(all, x + dx, y + dy)) return;
-    const std::uint32_t a = labels[CellIn(all, x, y)];
-    const std::uint32_t b = labels[CellIn(all, x + dx, y + dy)];
-    if (a == b) return;
-    Seam& seam = seams[std::minmax(a, b)];
-    ++seam.length;
-    for (std::int64_t i = -1; i <= 2; ++i) {
-      const std::int64_t cellX = x + i * dx;
-      const std::int64_t cellY = y + i * dy;
-      if (IsIn(all, cellX, cellY)) seam.cells.push_back(cellY * lattice.width + cellX);
-    }
-  };
-  for (std::int64_t y = 0; y < lattice.height; ++y) {
-    for (std::int64_t x = 0; x < lattice.width; ++x) {
-      cross(x, y, 1, 0);
-      cross(x, y, 0, 1);
-    }
-  }
   std::vector<SeamResidual> residuals;
-  for (auto& [pair, seam] : seams) {
+  for (const auto& [pair, seam] : TraceSeams(labels, lattice)) {
     const SceneView& first = scenes[pair.first];
     const SceneView& second = scenes[pair.second];
     SeamResidual residual{pair.first, pair.second, seam.length, 0, {}, {}};
     residual.meanDifference.resize(first.channels);
     residual.rootMeanSquare.resize(first.channels);
-    std::sort(seam.cells.begin(), seam.cells.end());
-    seam.cells.erase(std::unique(seam.cells.begin(), seam.cells.end()), seam.cells.end());
     for (const std::int64_t cell : seam.cells) {
       const std::int64_t x = cell % lattice.width;
       const std::int64_t y = cell / lattice.width;
@@ -346,11 +355,9 @@ std::vector<SeamResidual> SeamResiduals(const std::vector<std::uint32_t>& labels
         residual.rootMeanSquare[c] += difference * difference;
       }
     }
-    if (residual.cells > 0) {
-      const auto cells = static_cast<double>(residual.cells);
-      for (double& mean : residual.meanDifference) mean /= cells;
-      for (double& square : residual.rootMeanSquare) square = std::sqrt(square / cells);
-    }
+    const auto cells = static_cast<double>(std::max<std::int64_t>(residual.cells, 1));
+    for (double& mean : residual.meanDifference) mean /= cells;
+    for (double& square : residual.rootMeanSquare) square = std::sqrt(square / cells);
     residuals.push_back(std::move(residual));
   }
   return residuals;
