@@ -1,0 +1,239 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "apps/zarn/mosaic/reportfigures.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include "apps/zarn/mosaic/balance.h"
+#include "apps/zarn/mosaic/labellattice.h"
+
+namespace zarn::app {
+namespace {
+
+constexpr std::size_t kBins = 64;
+
+WindowSize LatticeOf(const Survey& survey) { return {survey.lattice.width, survey.lattice.height}; }
+
+// Calls `visit(index in the scene, cell of the lattice)` with the cells in which a scene has data.
+template <typename Visit>
+void VisitValid(const Window& area, const std::vector<std::uint8_t>& valid, WindowSize lattice,
+                const Visit& visit) {
+  std::size_t index = 0;
+  for (std::int64_t row = 0; row < area.height; ++row) {
+    auto cell = static_cast<std::size_t>((area.y + row) * lattice.width + area.x);
+    for (std::int64_t column = 0; column < area.width; ++column, ++index, ++cell) {
+      if (valid[index] != 0) visit(index, cell);
+    }
+  }
+}
+
+// Whether the centres of the cells of `area` lie in a polygon, row by row.
+std::vector<std::uint8_t> CentresWithin(const Polygon& polygon, const Window& area, int step) {
+  std::vector<std::vector<double>> crossings(static_cast<std::size_t>(area.height));
+  const std::vector<double>& v = polygon.vertices;
+  for (std::size_t part = 0; part < polygon.starts.size(); ++part) {
+    const auto begin = static_cast<std::size_t>(polygon.starts[part]);
+    const std::size_t end = part + 1 < polygon.starts.size()
+                                ? static_cast<std::size_t>(polygon.starts[part + 1])
+                                : v.size() / 2;
+    for (std::size_t i = begin; i < end; ++i) {
+      const std::size_t next = i + 1 < end ? i + 1 : begin;
+      const double x0 = v[2 * i];
+      const double y0 = v[2 * i + 1] / step;
+      const double slope = (v[2 * next] - x0) / (v[2 * next + 1] / step - y0);
+      const auto [low, high] = std::minmax(y0, v[2 * next + 1] / step);
+      // Rows whose middle lies in [low, high).
+      const double first = std::max(std::ceil(low - 0.5), static_cast<double>(area.y));
+      for (double row = first; row + 0.5 < high; ++row) {
+        if (row >= static_cast<double>(area.y + area.height)) break;
+        crossings[static_cast<std::size_t>(row) - static_cast<std::size_t>(area.y)].push_back(
+            x0 + (row + 0.5 - y0) * slope);
+      }
+    }
+  }
+  std::vector<std::uint8_t> within;
+  for (std::vector<double>& row : crossings) {
+    std::sort(row.begin(), row.end());
+    auto next = row.begin();
+    for (std::int64_t column = 0; column < area.width; ++column) {
+      const double centre = (static_cast<double>(area.x + column) + 0.5) * step;
+      next = std::find_if(next, row.end(), [&](double x) { return x > centre; });
+      within.push_back((next - row.begin()) % 2 == 0 ? 0 : 1);
+    }
+  }
+  return within;
+}
+
+/// Sums up values about the first of them, so that nothing is lost where they are large.
+class Moments {
+ public:
+  void Add(double value) {
+    if (count_ == 0) first_ = value;
+    ++count_;
+    sum_ += value - first_;
+    squares_ += (value - first_) * (value - first_);
+  }
+  void Add(const Moments& other) {
+    if (other.count_ == 0) return;
+    if (count_ == 0) first_ = other.first_;
+    const auto count = static_cast<double>(other.count_);
+    const double shift = other.first_ - first_;
+    count_ += other.count_;
+    squares_ += other.squares_ + 2 * shift * other.sum_ + count * shift * shift;
+    sum_ += other.sum_ + count * shift;
+  }
+  std::int64_t Count() const { return count_; }
+  double Mean() const { return count_ > 0 ? first_ + sum_ / static_cast<double>(count_) : 0; }
+  double Deviation() const {
+    if (count_ == 0) return 0;
+    const auto count = static_cast<double>(count_);
+    return std::sqrt(std::max(0.0, squares_ / count - sum_ / count * (sum_ / count)));
+  }
+
+ private:
+  std::int64_t count_ = 0;
+  double first_ = 0;
+  double sum_ = 0;
+  double squares_ = 0;
+};
+
+std::vector<SceneView> ViewsOf(const Planning& planning, bool corrected) {
+  std::vector<SceneView> views;
+  views.reserve(planning.plan.scenes.size());
+  for (std::size_t i = 0; i < planning.plan.scenes.size(); ++i) {
+    views.push_back(ViewOf(*planning.survey, i, corrected ? &planning.plan.scenes[i] : nullptr));
+  }
+  return views;
+}
+
+// Calls `use(scene, value, mean of the others)` with all values that other scenes share.
+template <typename Use>
+void VisitCommon(const std::vector<SceneView>& views, WindowSize lattice, std::size_t band,
+                 const Use& use) {
+  const auto cells = static_cast<std::size_t>(lattice.width * lattice.height);
+  std::vector<double> sums(cells);
+  std::vector<std::uint32_t> counts(cells);
+  const auto value = [&](const SceneView& view, std::size_t index) {
+    return static_cast<double>(view.colours[index * view.channels + band]);
+  };
+  for (const SceneView& view : views) {
+    VisitValid(view.area, view.valid, lattice, [&](std::size_t index, std::size_t cell) {
+      if (!std::isfinite(value(view, index))) return;
+      sums[cell] += value(view, index);
+      ++counts[cell];
+    });
+  }
+  for (std::size_t i = 0; i < views.size(); ++i) {
+    VisitValid(views[i].area, views[i].valid, lattice, [&](std::size_t index, std::size_t cell) {
+      const double own = value(views[i], index);
+      if (counts[cell] < 2 || !std::isfinite(own)) return;
+      use(i, own, (sums[cell] - own) / (counts[cell] - 1));
+    });
+  }
+}
+
+Agreement Measure(const std::vector<SceneView>& views, WindowSize lattice,
+                  const std::vector<std::uint32_t>& shown, std::vector<Moments>& pooled) {
+  Agreement agreement;
+  agreement.seams = SeamResiduals(shown, lattice, views);
+  agreement.scenes.assign(views.size(), std::vector<CommonValues>(pooled.size()));
+  for (std::size_t band = 0; band < pooled.size(); ++band) {
+    std::vector<Moments> own(views.size());
+    std::vector<Moments> others(views.size());
+    VisitCommon(views, lattice, band, [&](std::size_t scene, double value, double other) {
+      own[scene].Add(value);
+      others[scene].Add(other);
+    });
+    for (std::size_t i = 0; i < views.size(); ++i) {
+      agreement.scenes[i][band] = {.count = own[i].Count(),
+                                   .mean = own[i].Mean(),
+                                   .deviation = own[i].Deviation(),
+                                   .othersMean = others[i].Mean(),
+                                   .bins = {}};
+      pooled[band].Add(own[i]);
+    }
+  }
+  return agreement;
+}
+
+void FillBins(const std::vector<SceneView>& views, WindowSize lattice,
+              const std::vector<HistogramAxis>& axes, Agreement& agreement) {
+  for (std::size_t band = 0; band < axes.size(); ++band) {
+    const HistogramAxis& axis = axes[band];
+    for (auto& scene : agreement.scenes) scene[band].bins.assign(axis.bins, 0);
+    VisitCommon(views, lattice, band, [&](std::size_t scene, double value, double) {
+      const double bin = (value - axis.begin) / axis.width;
+      if (!(bin >= 0 && bin < static_cast<double>(axis.bins))) return;
+      ++agreement.scenes[scene][band].bins[static_cast<std::size_t>(bin)];
+    });
+  }
+}
+
+// Three deviations about the mean. Bins of whole numbers are whole numbers wide, as some would
+// else hold one number more than others.
+HistogramAxis AxisFor(const Moments& pooled, bool isInteger) {
+  const double reach = std::max(3 * pooled.Deviation(), 1e-6 * std::abs(pooled.Mean()) + 1e-12);
+  HistogramAxis axis{.begin = pooled.Mean() - reach,
+                     .width = 2 * reach / static_cast<double>(kBins),
+                     .bins = kBins,
+                     .decimals = 0};
+  if (isInteger) {
+    axis.width = std::ceil(axis.width);
+    axis.begin = std::floor(axis.begin) - 0.5;
+    axis.bins = static_cast<std::size_t>(std::ceil(2 * reach / axis.width)) + 1;
+  }
+  // Differences are looked at to a ten-thousandth of what there is to see.
+  axis.decimals = static_cast<int>(std::clamp(4 - std::floor(std::log10(2 * reach)), 0.0, 12.0));
+  return axis;
+}
+
+}  // namespace
+
+std::vector<std::uint32_t> ShownScenes(const Planning& planning) {
+  const Survey& survey = *planning.survey;
+  const WindowSize lattice = LatticeOf(survey);
+  std::vector<std::uint32_t> shown(static_cast<std::size_t>(lattice.width * lattice.height),
+                                   kNoLabel);
+  for (std::size_t i = 0; i < survey.scenes.size(); ++i) {
+    const SurveyedScene& scene = survey.scenes[i];
+    const auto label = static_cast<std::uint32_t>(i);
+    if (!planning.labels.empty()) {
+      VisitValid(scene.area, scene.valid, lattice, [&](std::size_t, std::size_t cell) {
+        if (planning.labels[cell] == label) shown[cell] = label;
+      });
+      continue;
+    }
+    const Polygon& cutline = planning.plan.scenes[i].cutline;
+    const std::vector<std::uint8_t> within =
+        cutline.Empty() ? scene.valid : CentresWithin(cutline, scene.area, survey.step);
+    VisitValid(scene.area, scene.valid, lattice, [&](std::size_t index, std::size_t cell) {
+      if (within[index] != 0) shown[cell] = label;
+    });
+  }
+  if (!planning.plan.fillsGaps) return shown;
+  for (std::size_t i = 0; i < survey.scenes.size(); ++i) {
+    const SurveyedScene& scene = survey.scenes[i];
+    VisitValid(scene.area, scene.valid, lattice, [&](std::size_t, std::size_t cell) {
+      if (shown[cell] == kNoLabel) shown[cell] = static_cast<std::uint32_t>(i);
+    });
+  }
+  return shown;
+}
+
+ReportFigures MeasureAgreement(const Planning& planning) {
+  const Survey& survey = *planning.survey;
+  const WindowSize lattice = LatticeOf(survey);
+  const std::vector<std::uint32_t> shown = ShownScenes(planning);
+  std::vector<Moments> pooled(survey.channels);
+  ReportFigures figures;
+  // One state at a time: the values of all scenes take memory.
+  figures.before = Measure(ViewsOf(planning, false), lattice, shown, pooled);
+  figures.after = Measure(ViewsOf(planning, true), lattice, shown, pooled);
+  const bool isInteger = GDALDataTypeIsInteger(survey.type.gdal) != 0;
+  for (const Moments& band : pooled) figures.axes.push_back(AxisFor(band, isInteger));
+  FillBins(ViewsOf(planning, false), lattice, figures.axes, figures.before);
+  FillBins(ViewsOf(planning, true), lattice, figures.axes, figures.after);
+  return figures;
+}
+
+}  // namespace zarn::app
