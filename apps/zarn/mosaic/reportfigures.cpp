@@ -197,13 +197,9 @@ std::vector<std::uint32_t> ShownScenes(const Planning& planning) {
   for (std::size_t i = 0; i < survey.scenes.size(); ++i) {
     const SurveyedScene& scene = survey.scenes[i];
     const auto label = static_cast<std::uint32_t>(i);
-    if (!planning.labels.empty()) {
-      VisitValid(scene.area, scene.valid, lattice, [&](std::size_t, std::size_t cell) {
-        if (planning.labels[cell] == label) shown[cell] = label;
-      });
-      continue;
-    }
     const Polygon& cutline = planning.plan.scenes[i].cutline;
+    // A seam may have left nothing of a scene.
+    if (cutline.Empty() && !planning.labels.empty()) continue;
     const std::vector<std::uint8_t> within =
         cutline.Empty() ? scene.valid : CentresWithin(cutline, scene.area, survey.step);
     VisitValid(scene.area, scene.valid, lattice, [&](std::size_t index, std::size_t cell) {

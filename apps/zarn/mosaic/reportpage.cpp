@@ -51,7 +51,8 @@ std::string UnitName(const OGRSpatialReference& crs) {
 std::string Facts(const MosaicOptions& options, const MosaicPlan& plan) {
   std::string facts;
   const OutputGrid& grid = plan.grid;
-  facts += Fact("Size", std::to_string(grid.width) + " x " + std::to_string(grid.height));
+  facts +=
+      Fact("Size", std::to_string(grid.width) + " x " + std::to_string(grid.height) + " pixels");
   facts += Fact("Pixel", Shortest(std::abs(grid.transform[1])) + " x " +
                              Shortest(std::abs(grid.transform[5])) + UnitName(grid.crs));
   facts += Fact("Coordinate system", CrsName(grid.crs));
@@ -114,10 +115,10 @@ std::string Histogram(const CommonValues& values, const HistogramAxis& axis, std
          MarkAt(axis, values.othersMean, "others") + "</svg>";
 }
 
-std::string StateCells(const CommonValues& values, const HistogramAxis& axis, std::int64_t most,
-                       const std::string& name) {
-  return Cell(Histogram(values, axis, most, name)) + Cell(Fixed(values.mean, axis.decimals)) +
-         Cell(Fixed(values.deviation, axis.decimals)) +
+std::string StateCells(const char* state, const CommonValues& values, const HistogramAxis& axis,
+                       std::int64_t most, const std::string& name) {
+  return TextCell(state) + Cell(Histogram(values, axis, most, name + ", " + state)) +
+         Cell(Fixed(values.mean, axis.decimals)) + Cell(Fixed(values.deviation, axis.decimals)) +
          Cell(Fixed(values.othersMean, axis.decimals));
 }
 
@@ -135,20 +136,17 @@ std::string SceneCard(std::size_t scene, const std::string& label, const Rgb& co
   if (before.front().count == 0) {
     return card + "<p class=\"faint\">No other scene has data where this one has.</p></article>";
   }
-  card += "<div class=\"wide\" role=\"region\" aria-labelledby=\"scene-" + number +
-          "\" tabindex=\"0\"><table class=\"common\"><thead><tr><th>Band</th>";
-  for (const char* const state : {"Before", "After"}) {
-    card += std::string("<th class=\"text\">") + state +
-            "</th><th>Mean</th><th>Dev.</th><th>Others</th>";
-  }
-  card += "</tr></thead><tbody>";
+  card +=
+      "<div class=\"wide\" role=\"region\" aria-labelledby=\"scene-" + number +
+      "\" tabindex=\"0\"><table class=\"common\"><thead><tr><th class=\"text\">Band</th><th></th>"
+      "<th></th><th>Mean</th><th>Std. dev.</th><th>Others</th></tr></thead><tbody>";
   for (std::size_t band = 0; band < before.size(); ++band) {
     const HistogramAxis& axis = figures.axes[band];
     const std::int64_t most = std::max(Most(before[band]), Most(after[band]));
     const std::string name = label + ", band " + std::to_string(band + 1);
-    card += "<tr><th>" + std::to_string(band + 1) + "</th>" +
-            StateCells(before[band], axis, most, name + " before") +
-            StateCells(after[band], axis, most, name + " after") + "</tr>";
+    card += "<tr class=\"before\"><th rowspan=\"2\">" + std::to_string(band + 1) + "</th>" +
+            StateCells("before", before[band], axis, most, name) + "</tr><tr>" +
+            StateCells("after", after[band], axis, most, name) + "</tr>\n";
   }
   return card + "</tbody></table></div></article>\n";
 }
@@ -231,7 +229,7 @@ std::string TimeRows(const std::vector<std::pair<std::string, double>>& seconds)
 }
 
 std::string SeamsNote(const MosaicOptions& options, const ReportContents& contents) {
-  if (!contents.seams.empty()) return "Cutlines where they part two scenes, over the mosaic.";
+  if (!contents.seams.empty()) return "The cutlines where they part two scenes, over the mosaic.";
   const bool hasCutlines = !options.cutlines.empty() || options.seams == "path";
   return hasCutlines ? "No cutline parts two scenes." : "The scenes were pasted whole.";
 }
@@ -257,6 +255,7 @@ std::string ReportPage(const MosaicOptions& options, const Planning& planning,
                  {"width", std::to_string(contents.width)},
                  {"height", std::to_string(contents.height)},
                  {"aspect", Fixed(static_cast<double>(contents.width) / contents.height, 5)},
+                 {"shape", contents.width < contents.height ? " tall" : ""},
                  {"fine", std::max(contents.width, contents.height) < kFine ? " fine" : ""},
                  {"before", contents.before},
                  {"after", contents.after},

@@ -45,8 +45,9 @@ th, td { padding: .3rem .7rem; border-bottom: 1px solid var(--rule); text-align:
   vertical-align: top; }
 thead th { color: var(--faint); font-weight: 600; white-space: nowrap; vertical-align: bottom; }
 th.text, td.text { text-align: left; }
-td.text { overflow-wrap: anywhere; min-width: 9rem; }
-tbody th { font-weight: 600; text-align: left; }
+#scenes td.text { overflow-wrap: anywhere; min-width: 9rem; }
+thead th[colspan] { text-align: center; }
+tbody th { font-weight: 600; text-align: left; white-space: nowrap; }
 .swatch { display: inline-block; width: .85em; height: .85em; margin-right: .45em;
   border-radius: .2em; vertical-align: -.05em; }
 
@@ -55,9 +56,17 @@ tbody th { font-weight: 600; text-align: left; }
   background: repeating-conic-gradient(#8883 0 25%, transparent 0 50%) 0 0 / 16px 16px; }
 .stage > img, .stage > svg { display: block; width: 100%; height: 100%; }
 .stage.fine { image-rendering: pixelated; }
-.side-by-side { display: grid; gap: 2rem;
+.pictures { display: grid; gap: 0 2rem; align-items: start; margin-top: 2rem;
   grid-template-columns: repeat(auto-fit, minmax(min(100%, 26rem), 1fr)); }
-.side-by-side h2 { margin-top: 0; }
+.pictures > :first-child { grid-column: 1 / -1; }
+.pictures.tall { grid-template-columns: repeat(auto-fit, minmax(min(100%, 19rem), 1fr)); }
+.pictures.tall > :first-child { grid-column: auto; }
+.pictures h2 { margin: 0 0 .5rem; }
+.pictures p { margin: .5rem 0 2rem; }
+#seams-section { display: grid; grid-template-columns: auto 1fr; justify-items: start; }
+#seams-section > * { grid-column: 1 / -1; }
+#seams-section > input { grid-area: 3 / 1; }
+#seams-section > label { grid-area: 3 / 2; line-height: 1.75rem; }
 
 /* Without script the two pictures stand side by side. */
 #swipe { display: grid; grid-template-columns: 1fr 1fr; gap: 4px;
@@ -70,12 +79,12 @@ tbody th { font-weight: 600; text-align: left; }
 .js #swipe::after { content: ""; position: absolute; inset: 0 auto 0 var(--split); width: 2px;
   margin-left: -1px; background: #fff; box-shadow: 0 0 0 1px #0008; }
 .js #split-control { display: flex; align-items: center; gap: .75rem; margin-top: .6rem;
-  width: min(100%, 85vh * {{aspect}}); }
+  width: min(100%, max(16rem, 85vh * {{aspect}})); }
 #split { flex: 1; min-width: 0; height: 1.75rem; margin: 0; accent-color: var(--accent); }
 
-#show-seams { width: 1.1rem; height: 1.1rem; margin: 0 .4rem 0 0; vertical-align: -.15rem;
+#show-seams { width: 1.1rem; height: 1.1rem; margin: .9rem .5rem 0 0;
   accent-color: var(--accent); }
-#show-seams ~ .stage { margin-top: .6rem; }
+#show-seams + label { margin-top: .6rem; }
 #show-seams:not(:checked) ~ .stage #seams { display: none; }
 #seam-path { fill: none; stroke-linejoin: round; stroke-linecap: round;
   vector-effect: non-scaling-stroke; }
@@ -83,12 +92,14 @@ tbody th { font-weight: 600; text-align: left; }
 #seams .line { stroke: #ffe600; stroke-width: 1.75px; }
 
 .cards { display: grid; gap: 1rem;
-  grid-template-columns: repeat(auto-fit, minmax(min(100%, 34rem), 1fr)); }
+  grid-template-columns: repeat(auto-fill, minmax(min(100%, 25rem), 1fr)); }
 .card { padding: .9rem 1rem; border-radius: .5rem; background: var(--card); min-width: 0; }
 .card table { width: 100%; }
-.card th, .card td { padding: .3rem .4rem; white-space: nowrap; }
-.card tr:last-child > * { border-bottom: 0; }
-.histogram { display: block; width: 8.5rem; height: 2.75rem; }
+.card th, .card td { padding: .1rem .35rem; white-space: nowrap; vertical-align: middle;
+  border-bottom: 0; }
+.card th:first-child { padding-left: 0; vertical-align: top; }
+.card .before > * { padding-top: .45rem; border-top: 1px solid var(--rule); }
+.histogram { display: block; width: 8rem; height: 2rem; }
 .histogram path { fill: var(--bars); }
 .histogram line { stroke: var(--accent); stroke-width: 2px; vector-effect: non-scaling-stroke; }
 .histogram .others { stroke: var(--others); stroke-dasharray: 4 3; }
@@ -99,7 +110,9 @@ tbody th { font-weight: 600; text-align: left; }
 td.chart { width: 40%; min-width: 6rem; vertical-align: middle; }
 @media (max-width: 40rem) {
   .card { padding: .75rem; }
-  .histogram { width: 6rem; }
+  .card table { font-size: .8rem; }
+  .card th, .card td { padding: .1rem .15rem; }
+  .histogram { width: 4.5rem; }
 }
 @media print { .stage, .card { break-inside: avoid; } }
 </style>
@@ -112,11 +125,9 @@ td.chart { width: 40%; min-width: 6rem; vertical-align: middle; }
 <dl>{{facts}}</dl>
 </header>
 <main>
+<div class="pictures{{shape}}">
 <section aria-labelledby="balance-title">
 <h2 id="balance-title">Before and after</h2>
-<p>Before: the scenes pasted whole, one over the other, as they are{{freed}}. After: the mosaic.
-Both are shown alike: in each band the 2&nbsp;% darkest and brightest pixels of the picture before
-are black and white.</p>
 <div class="stage{{fine}}" id="swipe">
 <img src="{{before}}" width="{{width}}" height="{{height}}" alt="The scenes pasted without corrections" draggable="false">
 <svg id="after-picture" viewBox="0 0 {{width}} {{height}}" role="img" aria-label="The mosaic"><image id="after" href="{{after}}" width="{{width}}" height="{{height}}"/></svg>
@@ -126,18 +137,20 @@ are black and white.</p>
 <input id="split" type="range" min="0" max="100" step="0.5" value="50" aria-label="Where the mosaic begins, from the left">
 <label for="split">After</label>
 </div>
+<p class="faint">Before: the scenes pasted whole, one over the other, as they are{{freed}}. After: the
+mosaic. In both the 2&nbsp;% darkest and brightest pixels of each band before are black and
+white.</p>
 </section>
-<div class="side-by-side" style="margin-top:2.5rem">
 <section aria-labelledby="sources-title">
 <h2 id="sources-title">Sources</h2>
-<p>The scene that each pixel comes from.</p>
 <div class="stage{{fine}}"><img src="{{map}}" width="{{width}}" height="{{height}}" alt="Map of the scenes in the colours of the list below"></div>
+<p class="faint">The scene that each pixel comes from, in the colours of the list below.</p>
 </section>
-<section aria-labelledby="seams-title">
+<section aria-labelledby="seams-title" id="seams-section">
 <h2 id="seams-title">Seams</h2>
-<p>{{seamsNote}}</p>
 <input id="show-seams" type="checkbox" checked><label for="show-seams">Show the seams</label>
 <div class="stage{{fine}}"><svg viewBox="0 0 {{width}} {{height}}" role="img" aria-label="The mosaic with its seams"><defs><path id="seam-path" d="{{seams}}"/></defs><use href="#after"/><g id="seams"><use class="casing" href="#seam-path"/><use class="line" href="#seam-path"/></g></svg></div>
+<p class="faint">{{seamsNote}}</p>
 </section>
 </div>
 <section aria-labelledby="scenes-title">
@@ -145,7 +158,7 @@ are black and white.</p>
 <p>In the order of pasting.</p>
 <div class="wide" role="region" aria-labelledby="scenes-title" tabindex="0">
 <table id="scenes">
-<thead><tr><th>No.</th><th class="text">Scene</th><th class="text">File</th><th>Pixels</th><th>Share</th></tr></thead>
+<thead><tr><th class="text">No.</th><th class="text">Scene</th><th class="text">File</th><th>Pixels</th><th>Share</th></tr></thead>
 <tbody>{{scenes}}</tbody>
 </table>
 </div>
