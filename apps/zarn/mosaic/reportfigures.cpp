@@ -40,11 +40,11 @@ std::vector<std::uint8_t> CentresWithin(const Polygon& polygon, const Window& ar
       const std::size_t next = i + 1 < end ? i + 1 : begin;
       const double x0 = v[2 * i];
       const double y0 = v[2 * i + 1] / step;
-      const double slope = (v[2 * next] - x0) / (v[2 * next + 1] / step - y0);
-      const auto [low, high] = std::minmax(y0, v[2 * next + 1] / step);
-      // Rows whose middle lies in [low, high).
-      const double first = std::max(std::ceil(low - 0.5), static_cast<double>(area.y));
-      for (double row = first; row + 0.5 < high; ++row) {
+      const double y1 = v[2 * next + 1] / step;
+      const double slope = (v[2 * next] - x0) / (y1 - y0);
+      // Rows in whose middle the edge is, its lower end excluded.
+      const double first = std::max(std::ceil(std::min(y0, y1) - 0.5), static_cast<double>(area.y));
+      for (double row = first; row + 0.5 < std::max(y0, y1); ++row) {
         if (row >= static_cast<double>(area.y + area.height)) break;
         crossings[static_cast<std::size_t>(row) - static_cast<std::size_t>(area.y)].push_back(
             x0 + (row + 0.5 - y0) * slope);
