@@ -20,12 +20,13 @@ std::string MakePage(const MosaicOptions& options, const Planning& planning,
   contents.pixels = sources.Counts();
   contents.figures = MeasureAgreement(planning);
   contents.colours = SceneColours(planning.plan.scenes.size(), contents.figures.before.seams);
-  contents.map = DataUri(RenderSources(sources, contents.colours));
+  contents.map = DataUri(RenderSources(sources, contents.colours), PictureKind::kDrawing);
   contents.seams = SeamPath(planning.plan, sources);
   const Sampling before = SamplePaste(*planning.survey, sources.Grid());
   const Stretch stretch = StretchFor(before);
-  contents.before = DataUri(Render(before, stretch));
-  contents.after = DataUri(Render(SampleMosaic(options.output.target, sources), stretch));
+  contents.before = DataUri(Render(before, stretch), PictureKind::kPhotograph);
+  contents.after = DataUri(Render(SampleMosaic(options.output.target, sources), stretch),
+                           PictureKind::kPhotograph);
   return ReportPage(options, planning, contents);
 }
 

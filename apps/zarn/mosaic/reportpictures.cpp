@@ -19,8 +19,8 @@
 namespace zarn::app {
 namespace {
 
-// Of a picture as PNG; photographs of many pixels take several times as much.
-constexpr std::size_t kMostBytes = 600'000;
+// Photographs of more pixels take several times as much as PNG.
+constexpr std::size_t kMostExactPixels = 200'000;
 
 Sampling EmptySampling(const PictureGrid& grid, std::size_t channels) {
   Sampling sampling;
@@ -356,18 +356,19 @@ std::string SeamPath(const MosaicPlan& plan, const SourceTally& sources) {
   return drawing.Take();
 }
 
-std::string DataUri(const Picture& picture) {
+std::string DataUri(const Picture& picture, PictureKind kind) {
   bool isOpaque = true;
   for (std::size_t i = 3; i < picture.rgba.size(); i += 4) isOpaque &= picture.rgba[i] == 255;
   const DatasetPtr dataset = AsDataset(picture, isOpaque ? 3 : 4);
-  const std::string png = Encoded(*dataset, "PNG", "ZLEVEL=9");
-  if (!png.empty() && png.size() <= kMostBytes) return AsUri("png", png);
-  // JPEG has no holes.
-  const std::string small =
-      isOpaque ? Encoded(*dataset, "JPEG", "QUALITY=88") : Encoded(*dataset, "WEBP", "QUALITY=88");
-  if (!small.empty()) return AsUri(isOpaque ? "jpeg" : "webp", small);
-  if (png.empty()) throw RunError("cannot make pictures: this GDAL has no driver for PNG");
-  return AsUri("png", png);
+  if (kind == PictureKind::kPhotograph && picture.rgba.size() / 4 > kMostExactPixels) {
+    // JPEG has no holes.
+    const std::string bytes = isOpaque ? Encoded(*dataset, "JPEG", "QUALITY=88")
+                                       : Encoded(*dataset, "WEBP", "QUALITY=88");
+    if (!bytes.empty()) return AsUri(isOpaque ? "jpeg" : "webp", bytes);
+  }
+  const std::string bytes = Encoded(*dataset, "PNG", "ZLEVEL=6");
+  if (bytes.empty()) throw RunError("cannot make pictures: this GDAL has no driver for PNG");
+  return AsUri("png", bytes);
 }
 
 }  // namespace zarn::app

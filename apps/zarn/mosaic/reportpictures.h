@@ -59,7 +59,10 @@ Picture RenderSources(const SourceTally& sources, const std::vector<Rgb>& colour
 /// pixels of scenes on both sides.
 std::string SeamPath(const MosaicPlan& plan, const SourceTally& sources);
 
-/// A picture as a data: URI: as PNG, or, when that is large, in a format with losses.
-std::string DataUri(const Picture& picture);
+enum class PictureKind { kPhotograph, kDrawing };
+
+/// A picture as a data: URI: as PNG, which holds drawings of any size, but photographs of many
+/// pixels in a format with losses.
+std::string DataUri(const Picture& picture, PictureKind kind);
 
 }  // namespace zarn::app
