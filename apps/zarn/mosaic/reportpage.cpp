@@ -188,8 +188,9 @@ std::string ResidualRows(const Planning& planning, const ReportContents& content
     for (std::size_t band = 0; band < bands; ++band) {
       rows += "<tr>";
       if (band == 0) {
-        rows += "<th scope=\"rowgroup\"" + span + name(before.first) + name(before.second) +
-                "</th><td" + span + std::to_string(before.length * planning.survey->step) + "</td>";
+        rows.append("<th scope=\"rowgroup\"").append(span);
+        rows.append(name(before.first)).append(name(before.second)).append("</th><td").append(span);
+        rows.append(std::to_string(before.length * planning.survey->step)).append("</td>");
       }
       const int decimals = figures.axes[band].decimals;
       rows += Cell(std::to_string(band + 1)) + ResidualCells(before, band, decimals) +
