@@ -106,66 +106,71 @@ std::vector<SceneView> ViewsOf(const Planning& planning, bool corrected) {
   return views;
 }
 
-// Calls `use(scene, value, mean of the others)` with all values that other scenes share.
+// How many scenes have data in each cell of the lattice.
+std::vector<std::uint32_t> ScenesPerCell(const Survey& survey) {
+  const WindowSize lattice = LatticeOf(survey);
+  std::vector<std::uint32_t> counts(static_cast<std::size_t>(lattice.width * lattice.height));
+  for (const SurveyedScene& scene : survey.scenes) {
+    VisitValid(scene.area, scene.valid, lattice,
+               [&](std::size_t, std::size_t cell) { ++counts[cell]; });
+  }
+  return counts;
+}
+
+// Calls `use(value, cell)` with the values of a scene that others share.
 template <typename Use>
-void VisitCommon(const std::vector<SceneView>& views, WindowSize lattice, std::size_t band,
-                 const Use& use) {
-  const auto cells = static_cast<std::size_t>(lattice.width * lattice.height);
-  std::vector<double> sums(cells);
-  std::vector<std::uint32_t> counts(cells);
-  const auto value = [&](const SceneView& view, std::size_t index) {
-    return static_cast<double>(view.colours[index * view.channels + band]);
-  };
-  for (const SceneView& view : views) {
-    VisitValid(view.area, view.valid, lattice, [&](std::size_t index, std::size_t cell) {
-      if (!std::isfinite(value(view, index))) return;
-      sums[cell] += value(view, index);
-      ++counts[cell];
-    });
-  }
-  for (std::size_t i = 0; i < views.size(); ++i) {
-    VisitValid(views[i].area, views[i].valid, lattice, [&](std::size_t index, std::size_t cell) {
-      const double own = value(views[i], index);
-      if (counts[cell] < 2 || !std::isfinite(own)) return;
-      use(i, own, (sums[cell] - own) / (counts[cell] - 1));
-    });
-  }
+void VisitCommon(const SceneView& view, std::size_t band, WindowSize lattice,
+                 const std::vector<std::uint32_t>& counts, const Use& use) {
+  VisitValid(view.area, view.valid, lattice, [&](std::size_t index, std::size_t cell) {
+    if (counts[cell] < 2) return;
+    const auto value = static_cast<double>(view.colours[index * view.channels + band]);
+    if (std::isfinite(value)) use(value, cell);
+  });
 }
 
 Agreement Measure(const std::vector<SceneView>& views, WindowSize lattice,
-                  const std::vector<std::uint32_t>& shown, std::vector<Moments>& pooled) {
+                  const std::vector<std::uint32_t>& shown, const std::vector<std::uint32_t>& counts,
+                  std::vector<Moments>& pooled) {
   Agreement agreement;
   agreement.seams = SeamResiduals(shown, lattice, views);
   agreement.scenes.assign(views.size(), std::vector<CommonValues>(pooled.size()));
   for (std::size_t band = 0; band < pooled.size(); ++band) {
-    std::vector<Moments> own(views.size());
-    std::vector<Moments> others(views.size());
-    VisitCommon(views, lattice, band, [&](std::size_t scene, double value, double other) {
-      own[scene].Add(value);
-      others[scene].Add(other);
-    });
+    std::vector<double> sums(counts.size());
+    for (const SceneView& view : views) {
+      VisitCommon(view, band, lattice, counts,
+                  [&](double value, std::size_t cell) { sums[cell] += value; });
+    }
     for (std::size_t i = 0; i < views.size(); ++i) {
-      agreement.scenes[i][band] = {.count = own[i].Count(),
-                                   .mean = own[i].Mean(),
-                                   .deviation = own[i].Deviation(),
-                                   .othersMean = others[i].Mean(),
+      Moments own;
+      Moments others;
+      VisitCommon(views[i], band, lattice, counts, [&](double value, std::size_t cell) {
+        own.Add(value);
+        others.Add((sums[cell] - value) / (counts[cell] - 1));
+      });
+      agreement.scenes[i][band] = {.count = own.Count(),
+                                   .mean = own.Mean(),
+                                   .deviation = own.Deviation(),
+                                   .othersMean = others.Mean(),
                                    .bins = {}};
-      pooled[band].Add(own[i]);
+      pooled[band].Add(own);
     }
   }
   return agreement;
 }
 
 void FillBins(const std::vector<SceneView>& views, WindowSize lattice,
-              const std::vector<HistogramAxis>& axes, Agreement& agreement) {
-  for (std::size_t band = 0; band < axes.size(); ++band) {
-    const HistogramAxis& axis = axes[band];
-    for (auto& scene : agreement.scenes) scene[band].bins.assign(axis.bins, 0);
-    VisitCommon(views, lattice, band, [&](std::size_t scene, double value, double) {
-      const double bin = (value - axis.begin) / axis.width;
-      if (!(bin >= 0 && bin < static_cast<double>(axis.bins))) return;
-      ++agreement.scenes[scene][band].bins[static_cast<std::size_t>(bin)];
-    });
+              const std::vector<std::uint32_t>& counts, const std::vector<HistogramAxis>& axes,
+              Agreement& agreement) {
+  for (std::size_t i = 0; i < views.size(); ++i) {
+    for (std::size_t band = 0; band < axes.size(); ++band) {
+      const HistogramAxis& axis = axes[band];
+      std::vector<std::int64_t>& bins = agreement.scenes[i][band].bins;
+      bins.assign(axis.bins, 0);
+      VisitCommon(views[i], band, lattice, counts, [&](double value, std::size_t) {
+        const double bin = (value - axis.begin) / axis.width;
+        if (bin >= 0 && bin < static_cast<double>(axis.bins)) ++bins[static_cast<std::size_t>(bin)];
+      });
+    }
   }
 }
 
@@ -220,15 +225,16 @@ ReportFigures MeasureAgreement(const Planning& planning) {
   const Survey& survey = *planning.survey;
   const WindowSize lattice = LatticeOf(survey);
   const std::vector<std::uint32_t> shown = ShownScenes(planning);
+  const std::vector<std::uint32_t> counts = ScenesPerCell(survey);
   std::vector<Moments> pooled(survey.channels);
   ReportFigures figures;
   // One state at a time: the values of all scenes take memory.
-  figures.before = Measure(ViewsOf(planning, false), lattice, shown, pooled);
-  figures.after = Measure(ViewsOf(planning, true), lattice, shown, pooled);
+  figures.before = Measure(ViewsOf(planning, false), lattice, shown, counts, pooled);
+  figures.after = Measure(ViewsOf(planning, true), lattice, shown, counts, pooled);
   const bool isInteger = GDALDataTypeIsInteger(survey.type.gdal) != 0;
   for (const Moments& band : pooled) figures.axes.push_back(AxisFor(band, isInteger));
-  FillBins(ViewsOf(planning, false), lattice, figures.axes, figures.before);
-  FillBins(ViewsOf(planning, true), lattice, figures.axes, figures.after);
+  FillBins(ViewsOf(planning, false), lattice, counts, figures.axes, figures.before);
+  FillBins(ViewsOf(planning, true), lattice, counts, figures.axes, figures.after);
   return figures;
 }
 
