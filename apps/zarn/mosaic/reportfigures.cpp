@@ -187,8 +187,9 @@ HistogramAxis AxisFor(const Moments& pooled, bool isInteger) {
     axis.begin = std::floor(axis.begin) - 0.5;
     axis.bins = static_cast<std::size_t>(std::ceil(2 * reach / axis.width)) + 1;
   }
-  // Differences are looked at to a ten-thousandth of what there is to see.
-  axis.decimals = static_cast<int>(std::clamp(4 - std::floor(std::log10(2 * reach)), 0.0, 12.0));
+  // Differences are looked at to a ten-thousandth of what there is to see, within reason.
+  const double least = std::max(2 * reach, 0.01 * std::abs(pooled.Mean()));
+  axis.decimals = static_cast<int>(std::clamp(4 - std::floor(std::log10(least)), 0.0, 12.0));
   return axis;
 }
 

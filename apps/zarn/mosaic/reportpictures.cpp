@@ -197,6 +197,12 @@ class SeamDrawing {
   bool isDown_ = false;
 };
 
+// Whether an edge from `a` to `b`, of which one coordinate is given, lies on the frame of a picture
+// that is so wide or high.
+bool IsAlongFrame(double a, double b, double size) {
+  return (a <= 0 && b <= 0) || (a >= size && b >= size);
+}
+
 }  // namespace
 
 Sampling SamplePaste(const Survey& survey, const PictureGrid& grid) {
@@ -347,7 +353,12 @@ std::string SeamPath(const MosaicPlan& plan, const SourceTally& sources) {
         const double nextY = v[2 * vertex + 1] * scaleY;
         // Vertices may be much closer than pixels of the picture.
         if (i < end && std::hypot(nextX - x, nextY - y) < kLeastEdge) continue;
-        drawing.Line(x, y, nextX, nextY);
+        if (IsAlongFrame(x, nextX, sources.Grid().Width()) ||
+            IsAlongFrame(y, nextY, sources.Grid().Height())) {
+          drawing.Lift();
+        } else {
+          drawing.Line(x, y, nextX, nextY);
+        }
         x = nextX;
         y = nextY;
       }
