@@ -254,6 +254,10 @@ void AddMosaicCommand(CLI::App& app) {
   CLI::App& command =
       *app.add_subcommand("mosaic", "Join overlapping scenes into one seamless mosaic");
   const auto parsed = AddMosaicOptions(command);
+  Declarer(command).Add(
+      "--report", parsed->mosaic.report, "DIR",
+      "Folder for a page (index.html) that shows the mosaic before and after its corrections, its "
+      "sources and seams, and in numbers how well the scenes agree");
   AddPlanCommand(command);
   AddRunCommand(command);
   AddFinishCommand(command);

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <chrono>
 #include <filesystem>
 #include <fstream>
 #include <memory>
@@ -15,6 +16,7 @@
 #include "apps/zarn/estimate/stagedjson.h"
 #include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/mosaic/mosaicfile.h"
+#include "apps/zarn/mosaic/mosaicreport.h"
 #include "apps/zarn/mosaic/tilerunner.h"
 #include "apps/zarn/progress.h"
 #include "apps/zarn/stagingfolder.h"
@@ -71,6 +73,13 @@ class TileFolder {
   fs::path folder_;
   std::string fingerprint_;
 };
+
+template <typename Work>
+double Seconds(const Work& work) {
+  const auto start = std::chrono::steady_clock::now();
+  work();
+  return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+}
 
 OutputGrid PartOf(const OutputGrid& grid, const Window& window) {
   OutputGrid part = grid;
@@ -145,18 +154,29 @@ void JoinAsVrt(const MosaicPlan& plan, const TileFolder& folder, std::size_t cou
 void MakeMosaic(const MosaicOptions& options) {
   SetUp(options.work);
   RefuseVrt(options.output);
+  std::optional<MosaicReport> report;
+  if (!options.report.empty()) report.emplace(options);
   TerminalProgress progress(options.work.quiet);
   ProgressSpan planningSpan(progress, 0, 0.2);
-  const Planning planning = MakePlan(options, planningSpan);
+  Planning planning = MakePlan(options, planningSpan);
   const MosaicPlan& plan = planning.plan;
+  if (report) report->Begin(plan);
   const RasterSource like = FirstScene(plan);
   MosaicFile file(plan, like, plan.grid, plan.output, plan.sourceMap);
-  ProgressSpan running(progress, 0.2, file.CopiesAtTheEnd() ? 0.7 : 0.99);
-  RunTiles(
-      plan, like, plan.Tiles(), options.work,
-      [&](const TilePlan&, TileBuffers& tile) { file.Write(tile, 0, 0); }, running);
-  ProgressSpan publishing(progress, file.CopiesAtTheEnd() ? 0.7 : 0.99, 1);
-  file.Publish(publishing);
+  const double end = report ? 0.97 : 1;
+  const double pasted = file.CopiesAtTheEnd() ? 0.7 : end - 0.01;
+  ProgressSpan running(progress, 0.2, pasted);
+  const auto take = [&](const TilePlan& part, TileBuffers& tile) {
+    if (report) report->Take(part, tile);
+    file.Write(tile, 0, 0);
+  };
+  const auto run = [&] { RunTiles(plan, like, plan.Tiles(), options.work, take, running); };
+  planning.seconds.emplace_back("tiles", Seconds(run));
+  ProgressSpan publishing(progress, pasted, end);
+  planning.seconds.emplace_back("publishing", Seconds([&] { file.Publish(publishing); }));
+  if (!report) return;
+  report->Publish(planning);
+  progress.Update(1);
 }
 
 void WritePlan(const MosaicOptions& options, const std::string& file) {

@@ -16,6 +16,7 @@
 #include "apps/zarn/mosaic/cutlineset.h"
 #include "apps/zarn/mosaic/cutlinewriter.h"
 #include "apps/zarn/mosaic/mosaicfile.h"
+#include "apps/zarn/mosaic/mosaicreport.h"
 #include "apps/zarn/mosaic/seampolygons.h"
 #include "apps/zarn/mosaic/seams.h"
 #include "apps/zarn/nodata.h"
@@ -337,6 +338,7 @@ void Planner::Order() {
 void Planner::RefuseOutputs() const {
   std::vector<std::string> targets{options_.output.target, options_.sourceMap,
                                    options_.writeCutlines};
+  if (!options_.report.empty()) targets.push_back(ReportFile(options_.report).string());
   std::erase(targets, "");
   for (const std::string& target : targets) {
     std::error_code error;

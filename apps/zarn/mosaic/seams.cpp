@@ -289,7 +289,7 @@ Seams TraceSeams(const std::vector<std::uint32_t>& labels, WindowSize lattice) {
     if (!IsIn(all, x + dx, y + dy)) return;
     const std::uint32_t a = labels[CellIn(all, x, y)];
     const std::uint32_t b = labels[CellIn(all, x + dx, y + dy)];
-    if (a == b) return;
+    if (a == b || a == kNoLabel || b == kNoLabel) return;
     Seam& seam = seams[std::minmax(a, b)];
     ++seam.length;
     for (std::int64_t i = -1; i <= 2; ++i) {

@@ -65,7 +65,7 @@ struct SeamResidual {
 };
 
 /// One for each pair of scenes that have a seam, in the order of the pairs. `labels` as `FindSeams`
-/// returns them.
+/// returns them; cells with `kNoLabel` have no seams.
 std::vector<SeamResidual> SeamResiduals(const std::vector<std::uint32_t>& labels,
                                         WindowSize lattice, const std::vector<SceneView>& scenes);
 
