@@ -17,7 +17,9 @@
 #include "apps/zarn/interruption.h"
 #include "apps/zarn/pasting.h"
 #include "apps/zarn/progress.h"
+#include "apps/zarn/sourcemaptype.h"
 #include "apps/zarn/updatedraster.h"
+#include "apps/zarn/windowgeometry.h"
 #include "processes/filters/factories/cutlineblendingfactory.h"
 
 namespace zarn::app {
@@ -55,20 +57,11 @@ void RequireSameBands(const RasterSource& source, const RasterSource& mosaic) {
                  "; choose the same ones with gdal_translate -b");
 }
 
-Window Intersection(const Window& a, const Window& b) {
-  const std::int64_t x = std::max(a.x, b.x);
-  const std::int64_t y = std::max(a.y, b.y);
-  return {x, y, std::min(a.x + a.width, b.x + b.width) - x,
-          std::min(a.y + a.height, b.y + b.height) - y};
-}
-
-bool Empty(const Window& window) { return window.width <= 0 || window.height <= 0; }
-
 // The pixels that a polygon may have to do with.
 Window ReachOf(const RasterPolygon& polygon, const CutlineRequest& request, std::uint32_t feather,
                const RasterSource& mosaic) {
   const Window window = polygon.PixelsWithin({mosaic.Width(), mosaic.Height()}, feather);
-  if (Empty(window)) {
+  if (IsEmpty(window)) {
     throw RunError(request.file + " misses " + mosaic.Name() +
                    ": no polygon comes near any of its " + SizeText(mosaic) +
                    " pixels; compare their extents with ogrinfo -so and gdalinfo");
@@ -91,7 +84,7 @@ BlendPlan PlanBlend(const BlendOptions& options, const RasterSource& source) {
   const GridPlace place = PlaceOnGrid(mosaic, source);
   const Window covered = Intersection({0, 0, mosaic.Width(), mosaic.Height()},
                                       {place.column, place.row, source.Width(), source.Height()});
-  if (Empty(covered)) {
+  if (IsEmpty(covered)) {
     throw RunError(source.Name() + " misses " + mosaic.Name() +
                    ": they have no pixel in common; compare their extents with gdalinfo");
   }
@@ -103,7 +96,7 @@ BlendPlan PlanBlend(const BlendOptions& options, const RasterSource& source) {
     area = Intersection(area, ReachOf(*tile, options.tile, 0, mosaic));
   }
   area = Intersection(area, covered);
-  if (Empty(area)) {
+  if (IsEmpty(area)) {
     throw RunError("nothing to paste: " + options.cutline.file +
                    (tile ? " and " + options.tile.file : "") + " miss" + (tile ? "" : "es") +
                    " the pixels that " + source.Name() + " has in common with " + mosaic.Name());
@@ -119,13 +112,6 @@ BlendPlan PlanBlend(const BlendOptions& options, const RasterSource& source) {
   return plan;
 }
 
-SampleType TypeForId(std::int64_t id) {
-  using enum gobs::NativeDataTypeCode;
-  if (id <= 255) return {kUInt8, GDT_Byte};
-  if (id <= 65535) return {kUInt16, GDT_UInt16};
-  return {kUInt32, GDT_UInt32};
-}
-
 std::unique_ptr<UpdatedRaster> OpenMap(const BlendOptions& options, const RasterSource& mosaic) {
   const std::string& name = options.sourceMap;
   if (name.empty()) return nullptr;
@@ -134,7 +120,7 @@ std::unique_ptr<UpdatedRaster> OpenMap(const BlendOptions& options, const Raster
     throw UsageError("the source map " + name + " is the mosaic; name another file");
   }
   if (!fs::exists(fs::symlink_status(name, error))) {
-    return std::make_unique<UpdatedRaster>(name, mosaic, TypeForId(options.sourceId));
+    return std::make_unique<UpdatedRaster>(name, mosaic, SourceMapType(options.sourceId));
   }
   auto map = std::make_unique<UpdatedRaster>(name, options.inPlace);
   const RasterSource& raster = map->Source();

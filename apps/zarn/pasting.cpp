@@ -13,6 +13,7 @@
 #include "apps/zarn/anysampletype.h"
 #include "apps/zarn/blockreader.h"
 #include "apps/zarn/errors.h"
+#include "apps/zarn/opaquealpha.h"
 #include "apps/zarn/pipeline.h"
 #include "apps/zarn/progress.h"
 #include "apps/zarn/streamer.h"
@@ -237,9 +238,8 @@ class Paster {
     if (slot.source.alphas.Used()) return slot.source.alphas;
     opaque_.Shape(slot.window.width, slot.window.height, AlphaBytes());
     VisitAnySampleType(source_.Type().code, [&]<typename T>(std::type_identity<T>, std::size_t) {
-      T opaque = std::numeric_limits<T>::max();
-      if constexpr (std::is_floating_point_v<T>) opaque = 255;  // as GDAL has it
-      std::fill_n(reinterpret_cast<T*>(opaque_.Data()), opaque_.Size() / sizeof(T), opaque);
+      std::fill_n(reinterpret_cast<T*>(opaque_.Data()), opaque_.Size() / sizeof(T),
+                  OpaqueAlpha<T>());
     });
     return opaque_;
   }

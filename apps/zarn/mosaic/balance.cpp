@@ -111,32 +111,60 @@ class Network {
     }
   }
 
-  void FitSurfaces(std::vector<ScenePlan>& scenes) const {
-    const bool hasReference = order_.front() >= scenes.size();
-    std::vector<Correction> corrections;
-    for (const std::size_t scene : order_) {
-      corrections.emplace_back(scene < scenes.size() ? scenes[scene] : ScenePlan{});
+  // Onto the first one, a reference image.
+  void FitOntoReference(std::vector<ScenePlan>& scenes) const {
+    const std::vector<std::vector<double>> targets = Targets(1, [&](std::size_t, const auto& cell) {
+      return std::vector<double>(cell.values, cell.values + survey_.channels);
+    });
+    for (std::size_t i = 1; i < order_.size(); ++i) {
+      Fit(Pairs(targets[i], i, {}), i, GainLimits{}, scenes[order_[i]]);
     }
-    for (int round = 0; round < (hasReference ? 1 : kRounds); ++round) {
-      const std::vector<std::vector<double>> means = Targets(corrections, hasReference);
-      for (std::size_t i = hasReference ? 1 : 0; i < order_.size(); ++i) {
-        const std::vector<CellPair> cells = CellsOnto(means[i], i);
-        if (cells.size() < kLeastCommonCells) continue;
-        const Ground& ground = set_->Grounds()[i];
-        const DodgingFit fit = FitDodging(
-            cells, ground, LayGrid(ground.Size(), survey_.channels, kNodes), GainLimits{});
-        const Window& area = survey_.scenes[order_[i]].area;
-        scenes[order_[i]].dodging = DodgingPlan{fit.pivots, OnMosaic(fit.gains, survey_, area),
-                                                OnMosaic(fit.offsets, survey_, area)};
+  }
+
+  // Onto the means of all that have data. Contrast stays as the gains have it: a scene shares
+  // itself with those means, so a regression on them would flatten it.
+  // With `holdsFirst` the first one stays as it is, and rules where it has data.
+  void FitOntoEachOther(bool holdsFirst, std::vector<ScenePlan>& scenes) const {
+    std::vector<ScenePlan> before;
+    for (const std::size_t scene : order_) {
+      ScenePlan plan = scenes[scene];
+      if (plan.gains.empty()) {
+        plan.gains.assign(survey_.channels, 1.0);
+        plan.offsets.assign(survey_.channels, 0.0);
       }
-      for (std::size_t i = hasReference ? 1 : 0; i < order_.size(); ++i) {
-        const std::optional<DodgingPlan>& dodging = scenes[order_[i]].dodging;
-        if (dodging) corrections[i].Set(*dodging);
+      before.push_back(std::move(plan));
+    }
+    constexpr double kFirm = 1e12;
+    std::vector<Correction> corrections;
+    for (const ScenePlan& plan : before) corrections.emplace_back(plan);
+    for (int round = 0; round < kRounds; ++round) {
+      const std::vector<std::vector<double>> targets = Targets(
+          order_.size(),
+          [&](std::size_t scene, const Cell& cell) { return Corrected(corrections[scene], cell); });
+      for (std::size_t i = holdsFirst ? 1 : 0; i < order_.size(); ++i) {
+        if (holdsFirst) LetFirstRule(i, targets[i]);
+        Correction balanced(before[i]);
+        std::vector<double> values;
+        VisitCells(i, [&](const Cell& cell) {
+          const std::vector<double> corrected = Corrected(balanced, cell);
+          values.insert(values.end(), corrected.begin(), corrected.end());
+        });
+        ScenePlan& scene = scenes[order_[i]];
+        Fit(Pairs(targets[i], i, values), i, {.damping = kFirm, .contrast = 0}, scene);
+        if (!scene.dodging) continue;
+        AddGains(before[i], *scene.dodging);
+        corrections[i].Set(*scene.dodging);
       }
     }
   }
 
  private:
+  struct Cell {
+    std::int64_t column;
+    std::int64_t row;
+    const double* values;  ///< per channel
+  };
+
   // Calls `use` with all cells of a scene that have data.
   template <typename Use>
   void VisitCells(std::size_t scene, const Use& use) const {
@@ -145,89 +173,128 @@ class Network {
       for (std::int64_t column = cells.FirstColumn();
            column < cells.FirstColumn() + cells.Columns(); ++column) {
         const double* const values = cells.At(column, row);
-        if (values != nullptr) use(column, row, values);
+        if (values != nullptr) use(Cell{column, row, values});
       }
     }
   }
 
-  std::vector<double> Corrected(Correction& correction, std::int64_t column, std::int64_t row,
-                                const double* values) const {
+  std::vector<double> Corrected(Correction& correction, const Cell& cell) const {
     const CellLattice& lattice = set_->Cells(0).Lattice();
     const std::array<double, 6>& t = survey_.lattice.transform;
     // The mosaic's grid lies along the axes of its map.
-    const double x = (lattice.CentreX(column) - t[0]) / t[1] * survey_.step;
-    const double y = (lattice.CentreY(row) - t[3]) / t[5] * survey_.step;
-    std::vector<double> corrected(values, values + survey_.channels);
+    const double x = (lattice.CentreX(cell.column) - t[0]) / t[1] * survey_.step;
+    const double y = (lattice.CentreY(cell.row) - t[3]) / t[5] * survey_.step;
+    std::vector<double> corrected(cell.values, cell.values + survey_.channels);
     correction(static_cast<unsigned>(std::max(0.0, x)), static_cast<unsigned>(std::max(0.0, y)),
                corrected.data());
     return corrected;
   }
 
-  // What each scene is to become: per scene the cells one after the other, [cell][channel], NaN
-  // where it is alone.
-  std::vector<std::vector<double>> Targets(std::vector<Correction>& corrections,
-                                           bool hasReference) const;
-  std::vector<CellPair> CellsOnto(const std::vector<double>& targets, std::size_t scene) const;
+  // What the scenes are to become, per scene the cells one after the other, [cell][channel]: the
+  // mean of what the first `count` scenes are there by `value`, NaN where there is only one of
+  // several.
+  template <typename Value>
+  std::vector<std::vector<double>> Targets(std::size_t count, const Value& value) const {
+    struct Sum {
+      std::vector<double> values;
+      int count = 0;
+    };
+    std::map<std::pair<std::int64_t, std::int64_t>, Sum> sums;
+    for (std::size_t i = 0; i < count; ++i) {
+      VisitCells(i, [&](const Cell& cell) {
+        Sum& sum = sums[{cell.row, cell.column}];
+        const std::vector<double> values = value(i, cell);
+        sum.values.resize(values.size());
+        for (std::size_t c = 0; c < values.size(); ++c) sum.values[c] += values[c];
+        ++sum.count;
+      });
+    }
+    const int least = count == 1 ? 1 : 2;
+    std::vector<std::vector<double>> targets(order_.size());
+    for (std::size_t i = 0; i < order_.size(); ++i) {
+      VisitCells(i, [&](const Cell& cell) {
+        const auto found = sums.find({cell.row, cell.column});
+        const bool known = found != sums.end() && found->second.count >= least;
+        for (std::size_t c = 0; c < survey_.channels; ++c) {
+          targets[i].push_back(known ? found->second.values[c] / found->second.count
+                                     : std::numeric_limits<double>::quiet_NaN());
+        }
+      });
+    }
+    return targets;
+  }
+
+  void LetFirstRule(std::size_t scene, std::vector<double>& targets) const {
+    double* target = targets.data();
+    VisitCells(scene, [&](const Cell& cell) {
+      const double* const first = set_->Cells(0).At(cell.column, cell.row);
+      if (first != nullptr) std::copy_n(first, survey_.channels, target);
+      target += survey_.channels;
+    });
+  }
+
+  // The cells of a scene that have targets; their values are `values`, or where that is empty those
+  // of the survey. Both are as `Targets` has them and must outlive the pairs.
+  std::vector<CellPair> Pairs(const std::vector<double>& targets, std::size_t scene,
+                              const std::vector<double>& values) const {
+    std::vector<CellPair> pairs;
+    const CellLattice& lattice = set_->Cells(scene).Lattice();
+    std::size_t i = 0;
+    VisitCells(scene, [&](const Cell& cell) {
+      if (!std::isnan(targets[i])) {
+        pairs.push_back({lattice.CentreX(cell.column), lattice.CentreY(cell.row), &targets[i],
+                         values.empty() ? cell.values : &values[i]});
+      }
+      i += survey_.channels;
+    });
+    return pairs;
+  }
+
+  // Leaves a scene without surfaces that has too little in common with others.
+  void Fit(const std::vector<CellPair>& cells, std::size_t scene, const GainLimits& limits,
+           ScenePlan& plan) const {
+    if (cells.size() < kLeastCommonCells) return;
+    const Ground& ground = set_->Grounds()[scene];
+    const DodgingFit fit =
+        FitDodging(cells, ground, LayGrid(ground.Size(), survey_.channels, kNodes), limits);
+    const Window& area = survey_.scenes[order_[scene]].area;
+    plan.dodging = DodgingPlan{fit.pivots, OnMosaic(fit.gains, survey_, area),
+                               OnMosaic(fit.offsets, survey_, area)};
+  }
+
+  // Offsets that were fitted after gain and offset, as surfaces that hold both:
+  // v g + o + d = (v - p) g + p + (p g - p + o + d).
+  static void AddGains(const ScenePlan& before, DodgingPlan& dodging) {
+    const std::size_t channels = dodging.pivots.size();
+    for (std::size_t i = 0; i < dodging.offsets.values.size(); ++i) {
+      const std::size_t c = i % channels;
+      const double gain = before.gains[c];
+      const double pivot = dodging.pivots[c];
+      const double offset = pivot * gain - pivot + before.offsets[c];
+      dodging.gains.values[i] = static_cast<float>(gain);
+      dodging.offsets.values[i] =
+          static_cast<float>(offset + static_cast<double>(dodging.offsets.values[i]));
+    }
+  }
 
   const Survey& survey_;
   std::vector<std::size_t> order_;
   std::unique_ptr<SceneSet> set_;
 };
 
-std::vector<std::vector<double>> Network::Targets(std::vector<Correction>& corrections,
-                                                  bool hasReference) const {
-  struct Sum {
-    std::vector<double> values;
-    int count = 0;
-  };
-  std::map<std::pair<std::int64_t, std::int64_t>, Sum> sums;
-  const std::size_t contributors = hasReference ? 1 : order_.size();
-  for (std::size_t i = 0; i < contributors; ++i) {
-    VisitCells(i, [&](std::int64_t column, std::int64_t row, const double* values) {
-      Sum& sum = sums[{row, column}];
-      const std::vector<double> corrected = Corrected(corrections[i], column, row, values);
-      sum.values.resize(corrected.size());
-      for (std::size_t c = 0; c < corrected.size(); ++c) sum.values[c] += corrected[c];
-      ++sum.count;
-    });
-  }
-  const int least = hasReference ? 1 : 2;
-  std::vector<std::vector<double>> targets(order_.size());
-  for (std::size_t i = 0; i < order_.size(); ++i) {
-    VisitCells(i, [&](std::int64_t column, std::int64_t row, const double*) {
-      const auto found = sums.find({row, column});
-      const bool known = found != sums.end() && found->second.count >= least;
-      for (std::size_t c = 0; c < survey_.channels; ++c) {
-        targets[i].push_back(known ? found->second.values[c] / found->second.count
-                                   : std::numeric_limits<double>::quiet_NaN());
-      }
-    });
-  }
-  return targets;
-}
-
-std::vector<CellPair> Network::CellsOnto(const std::vector<double>& targets,
-                                         std::size_t scene) const {
-  std::vector<CellPair> pairs;
-  const CellLattice& lattice = set_->Cells(scene).Lattice();
-  const double* target = targets.data();
-  VisitCells(scene, [&](std::int64_t column, std::int64_t row, const double* values) {
-    if (!std::isnan(*target)) {
-      pairs.push_back({lattice.CentreX(column), lattice.CentreY(row), target, values});
-    }
-    target += survey_.channels;
-  });
-  return pairs;
-}
-
 }  // namespace
 
-void Balance(BalanceKind kind, const Survey& survey, std::size_t anchor,
+void Balance(BalanceKind kind, const Survey& survey, std::size_t anchor, bool holdsAnchor,
              std::vector<ScenePlan>& scenes) {
   if (kind == BalanceKind::kNone) return;
   const Network network(survey, anchor);
   network.SolveGainOffsets(scenes);
-  if (kind == BalanceKind::kDodging) network.FitSurfaces(scenes);
+  if (kind != BalanceKind::kDodging) return;
+  if (anchor >= scenes.size()) {
+    network.FitOntoReference(scenes);
+  } else {
+    network.FitOntoEachOther(holdsAnchor, scenes);
+  }
 }
 
 SceneView ViewOf(const Survey& survey, std::size_t index, const ScenePlan* scene) {

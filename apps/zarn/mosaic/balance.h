@@ -17,11 +17,11 @@ enum class BalanceKind { kNone, kGainOffset, kDodging };
 ///
 /// `survey` holds the scenes in the same order. The scene `anchor` of the survey, which may be one
 /// beyond `scenes` (a reference image), stays as it is. With `kGainOffset` all overlaps together
-/// give each scene a gain and an offset. `kDodging` starts from them and then gives each scene
-/// surfaces that bring it, place by place, onto the anchor if that is a reference image, and else
-/// onto the mean of all scenes that have data there; so no scene's errors run on into the others.
-/// Throws `RunError` when overlaps do not tie all scenes together.
-void Balance(BalanceKind kind, const Survey& survey, std::size_t anchor,
+/// give each scene a gain and an offset. `kDodging` gives each scene surfaces: onto the anchor if
+/// that is a reference image, gains and offsets; else offsets on top of its gain and offset, which
+/// bring it, place by place, onto the mean of all scenes that have data there, so that no scene's
+/// errors run on into the others. Throws `RunError` when overlaps do not tie all scenes together.
+void Balance(BalanceKind kind, const Survey& survey, std::size_t anchor, bool holdsAnchor,
              std::vector<ScenePlan>& scenes);
 
 /// A surveyed scene as it is after its correction, or before any where `scene` is null.

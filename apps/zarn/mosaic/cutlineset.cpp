@@ -10,6 +10,7 @@
 #include "apps/zarn/cutlinefile.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
+#include "apps/zarn/windowgeometry.h"
 
 namespace zarn::app {
 namespace {
@@ -46,10 +47,6 @@ std::set<std::string> ValuesOf(const std::string& file, const std::string& field
   std::set<std::string> values;
   for (const auto& feature : layer) values.insert(feature->GetFieldAsString(index));
   return values;
-}
-
-bool Meet(const Window& a, const Window& b) {
-  return a.x < b.x + b.width && b.x < a.x + a.width && a.y < b.y + b.height && b.y < a.y + a.height;
 }
 
 Polygon PolygonOf(const processes::filters::PolygonParam& param) {

@@ -12,6 +12,7 @@
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
 #include "apps/zarn/progress.h"
+#include "apps/zarn/sourcemaptype.h"
 
 namespace zarn::app {
 namespace {
@@ -49,7 +50,8 @@ MosaicFile::MosaicFile(const MosaicPlan& plan, const RasterSource& like, const O
   if (map.empty()) return;
   const OutputOptions options{
       .target = map, .format = {}, .creation = {}, .overwrite = image.overwrite};
-  const RasterSource numbers = GridRaster(map, grid, MapTypeFor(plan.scenes.size()));
+  const RasterSource numbers =
+      GridRaster(map, grid, SourceMapType(static_cast<std::int64_t>(plan.scenes.size())));
   map_.emplace(options, numbers, std::vector<double>{0}, &grid);
   // Whoever looks at the map wants to know which scenes the numbers stand for.
   for (std::size_t i = 0; i < plan.scenes.size(); ++i) {

@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "apps/zarn/errors.h"
+#include "apps/zarn/windowgeometry.h"
 #include "apps/zarn/wkt.h"
 
 namespace zarn::app {
@@ -178,10 +179,6 @@ MosaicPlan PlanOf(const Json& json) {
   for (const Json& scene : json.at("scenes")) plan.scenes.push_back(SceneOf(scene));
   if (plan.scenes.empty() || plan.tileSide < 1) throw UsageError("it has no scenes");
   return plan;
-}
-
-bool Meet(const Window& a, const Window& b) {
-  return a.x < b.x + b.width && b.x < a.x + a.width && a.y < b.y + b.height && b.y < a.y + a.height;
 }
 
 }  // namespace

@@ -22,6 +22,7 @@
 #include "apps/zarn/nodata.h"
 #include "apps/zarn/progress.h"
 #include "apps/zarn/sourcelocator.h"
+#include "apps/zarn/windowgeometry.h"
 #include "processes/filters/factories/cutlineblendingfactory.h"
 
 namespace zarn::app {
@@ -61,15 +62,6 @@ Window Clipped(const Window& window, const OutputGrid& grid) {
   return {x, y, std::clamp<std::int64_t>(window.x + window.width, x, grid.width) - x,
           std::clamp<std::int64_t>(window.y + window.height, y, grid.height) - y};
 }
-
-Window Intersection(const Window& a, const Window& b) {
-  const std::int64_t x = std::max(a.x, b.x);
-  const std::int64_t y = std::max(a.y, b.y);
-  return {x, y, std::max<std::int64_t>(0, std::min(a.x + a.width, b.x + b.width) - x),
-          std::max<std::int64_t>(0, std::min(a.y + a.height, b.y + b.height) - y)};
-}
-
-bool Empty(const Window& window) { return window.width <= 0 || window.height <= 0; }
 
 /// A scene while the grid is not settled yet.
 struct Candidate {
@@ -296,7 +288,7 @@ void Planner::PlaceScenes() {
                       high(ground.Row(x, y)) - low(top)};
     }
     scene.covers = Clipped(scene.covers, plan_.grid);
-    if (Empty(scene.covers)) {
+    if (IsEmpty(scene.covers)) {
       Warn(scene.File() + " lies outside of the mosaic's extent and is left out");
     } else {
       plan_.scenes.push_back(scene);
@@ -398,7 +390,7 @@ void Planner::BalanceScenes() {
     isScene = true;
   }
   if (isScene) {
-    Balance(kind, survey, anchor, plan_.scenes);
+    Balance(kind, survey, anchor, !options_.reference.empty(), plan_.scenes);
     return;
   }
   RasterSource source(options_.reference);
@@ -410,7 +402,7 @@ void Planner::BalanceScenes() {
   scene.covers = {0, 0, plan_.grid.width, plan_.grid.height};
   SilentProgress silent;
   TakeSurvey({scene}, options_.work, survey, silent);
-  Balance(kind, survey, survey.scenes.size() - 1, plan_.scenes);
+  Balance(kind, survey, survey.scenes.size() - 1, true, plan_.scenes);
   survey.scenes.pop_back();
 }
 
@@ -467,6 +459,7 @@ void Planner::SettleReach() {
                         held(std::ceil(right)) - held(std::floor(left)) + 2 * margin,
                         held(std::ceil(bottom)) - held(std::floor(top)) + 2 * margin};
     scene.reach = Intersection(around, scene.covers);
+    if (IsEmpty(scene.reach)) scene.reach = {};
   }
 }
 

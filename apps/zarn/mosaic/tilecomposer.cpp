@@ -9,6 +9,8 @@
 
 #include "apps/zarn/anysampletype.h"
 #include "apps/zarn/errors.h"
+#include "apps/zarn/opaquealpha.h"
+#include "apps/zarn/sourcemaptype.h"
 #include "apps/zarn/streamer.h"
 #include "processes/filters/factories/cutlineblendingfactory.h"
 #include "processes/filters/framework/nodata.h"
@@ -71,20 +73,13 @@ struct NoDataPixel {
 
 }  // namespace
 
-SampleType MapTypeFor(std::size_t scenes) {
-  using enum gobs::NativeDataTypeCode;
-  if (scenes <= 255) return {kUInt8, GDT_Byte};
-  if (scenes <= 65535) return {kUInt16, GDT_UInt16};
-  return {kUInt32, GDT_UInt32};
-}
-
 TileComposer::TileComposer(const MosaicPlan& plan, const RasterSource& like, bool writesMask)
     : plan_(plan),
       type_(like.Type()),
       channels_(like.Channels().size()),
       alphas_(like.Alphas().size()),
       writesMask_(writesMask),
-      mapType_(MapTypeFor(plan.scenes.size())) {}
+      mapType_(SourceMapType(static_cast<std::int64_t>(plan.scenes.size()))) {}
 
 void TileComposer::Begin(const Window& window, TileBuffers& tile) {
   const auto shape = [&](Plane& plane, std::size_t bytes) {
@@ -254,12 +249,11 @@ void TileComposer::MarkCoverage(TileBuffers& tile) const {
     }
     if (!image.alphas.Used()) return;
     VisitAnySampleType(type_.code, [&]<typename T>(std::type_identity<T>, std::size_t parts) {
-      T opaque = std::numeric_limits<T>::max();
-      if constexpr (std::is_floating_point_v<T>) opaque = 255;  // as GDAL has it
+      constexpr T kOpaque = OpaqueAlpha<T>();
       T* const alphas = reinterpret_cast<T*>(image.alphas.Data());
       const std::size_t samples = alphas_ * parts;
       for (std::size_t i = 0; i < count * samples; ++i) {
-        if (numbers[i / samples] != 0) alphas[i] = opaque;
+        if (numbers[i / samples] != 0) alphas[i] = kOpaque;
       }
     });
   });

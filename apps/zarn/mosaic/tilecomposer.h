@@ -23,9 +23,6 @@ struct TileBuffers {
   Plane spareMap;       ///< where they come from
 };
 
-/// The sample type of a map of that many scenes.
-SampleType MapTypeFor(std::size_t scenes);
-
 /// Pastes scenes into tiles, in order, each along its cutline with a feather.
 ///
 /// Where a tile has no data yet a scene is pasted whole, as far as its cutline and feather admit
