@@ -118,6 +118,7 @@ void RequireTiles(const TileFolder& folder, std::size_t count, bool withMap,
 void WriteVrt(const std::string& target, bool overwrite, const std::vector<std::string>& tiles) {
   StagingFolder staging(target, overwrite);
   std::vector<const char*> names;
+  names.reserve(tiles.size());
   for (const std::string& tile : tiles) names.push_back(tile.c_str());
   CPLErrorReset();
   int failed = FALSE;
