@@ -2,6 +2,7 @@
 #include "processes/filters/enhancement/cellestimator.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 
 #include "processes/filters/enhancement/powercurve.h"
@@ -42,6 +43,40 @@ HistogramBins AddSamples(const TilePixels<T>& tile, std::size_t channels, std::s
   return {histogram, static_cast<unsigned int>(kTopLevel<T>) + 1, std::min(least, most), most + 1};
 }
 
+// The same for many bytes that are all valid, in four histograms in turn: neighbours are often
+// alike, and a count waits for the one before where both go to the same bin.
+HistogramBins AddManyBytes(const TilePixels<std::uint8_t>& tile, std::size_t channels,
+                           std::size_t channel, std::uint64_t* histogram) {
+  std::array<std::array<std::uint64_t, 256>, 4> counts{};
+  for (std::size_t y = 0; y < tile.height; ++y) {
+    const std::uint8_t* sample = tile.samples + y * tile.stride * channels + channel;
+    std::size_t x = 0;
+    for (; x + 4 <= tile.width; x += 4) {
+      for (std::array<std::uint64_t, 256>& part : counts) {
+        ++part[*sample];
+        sample += channels;
+      }
+    }
+    for (; x < tile.width; ++x, sample += channels) ++counts[0][*sample];
+  }
+  for (std::size_t level = 0; level < 256; ++level) {
+    for (const std::array<std::uint64_t, 256>& part : counts) histogram[level] += part[level];
+  }
+  return {histogram, 256, 0, 256};
+}
+
+template <typename T>
+HistogramBins Count(const TilePixels<T>& tile, bool allValid, std::size_t channels,
+                    std::size_t channel, std::uint64_t* histogram) {
+  if constexpr (sizeof(T) == 1) {
+    constexpr std::size_t kMany = 2048;
+    if (allValid && tile.width * tile.height >= kMany) {
+      return AddManyBytes(tile, channels, channel, histogram);
+    }
+  }
+  return AddSamples(tile, channels, channel, histogram);
+}
+
 }  // namespace
 
 template <typename T>
@@ -55,10 +90,11 @@ CellStatus CellEstimator<T>::Estimate(const TilePixels<T>& tile, CellGrid& grid,
   const std::int64_t whole = std::int64_t{parameters_.tileWidth} * parameters_.tileHeight;
   const std::int64_t valid = CountValid(tile);
   if (valid == 0 || valid * kLeastShare < whole) return CellStatus::kNoData;
+  const bool allValid = valid == static_cast<std::int64_t>(tile.width * tile.height);
   CellStatus status = CellStatus::kValid;
   for (int c = 0; c < grid.Channels(); ++c) {
-    const HistogramBins bins = AddSamples(tile, static_cast<std::size_t>(grid.Channels()),
-                                          static_cast<std::size_t>(c), histogram);
+    const HistogramBins bins = Count(tile, allValid, static_cast<std::size_t>(grid.Channels()),
+                                     static_cast<std::size_t>(c), histogram);
     if (!SetStretch(bins, grid, cell, c)) status = CellStatus::kInvalid;
     std::fill(histogram + bins.begin, histogram + bins.end, 0);
   }

@@ -38,8 +38,8 @@ void TrimTails(const HistogramBins& bins, double leftTrim, double rightTrim, boo
     for (int i = std::max(low, begin); i <= std::min(high, end - 1); ++i) sum += bins.histogram[i];
     pixels = static_cast<double>(sum);
   }
-  // Empty bins are cut off, unless nothing may be. Passing over them keeps the subtractions, each of
-  // which waits for the one before, few.
+  // Empty bins are cut off, unless nothing may be. Passing over them keeps the subtractions, each
+  // of which waits for the one before, few.
   const auto isKept = [&](int bin, double& remaining) {
     if (bins.histogram[bin] == 0) return false;
     remaining -= static_cast<double>(bins.histogram[bin]);

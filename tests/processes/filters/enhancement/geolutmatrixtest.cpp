@@ -295,15 +295,15 @@ TEST(GeoLUTMatrix, LoadsStretchesFromTheTilesOfAnImage) {
 // The levels of tiles lie together, so that most of a histogram is empty; some of the pixels have
 // the lowest and the highest level.
 template <typename T>
-void ExpectTrimsTheWholeHistogram(int depth) {
+void ExpectTrimsTheWholeHistogram(int depth, int tile) {
   constexpr int kTop = std::numeric_limits<T>::max();
-  const auto level = [](int x, int y, int) {
+  const auto level = [&](int x, int y, int) {
     const int grain = (x * 31 + y * 57 + x * y) % 41;
-    if (x >= 8 && grain % 5 == 0) return x >= 16 ? kTop : 0;
+    if (x >= tile && grain % 5 == 0) return x >= 2 * tile ? kTop : 0;
     return kTop / 3 + grain;
   };
   MemoryRaster image;
-  FillImage<T>(24, 8, 1, level, image);
+  FillImage<T>(3 * tile, tile, 1, level, image);
   for (const auto& [left, right] : {std::pair(0.02, 0.1),
                                     {0.0, 0.3},
                                     {0.7, 0.6},
@@ -313,6 +313,7 @@ void ExpectTrimsTheWholeHistogram(int depth) {
                                     {0.2, -0.5}}) {
     for (int choice = 0; choice < 8; ++choice) {
       GLUTParameters parameters = Grid(1, 3, 1, depth);
+      parameters.tileWidth = parameters.tileHeight = tile;
       parameters.trimMethod = choice & 1;
       parameters.ignoreFirstBin = (choice & 2) != 0;
       parameters.ignoreLastBin = (choice & 4) != 0;
@@ -323,8 +324,8 @@ void ExpectTrimsTheWholeHistogram(int depth) {
       const TrimMethodPtr trim(CreateTrimMethod(static_cast<TrimMethod>(choice & 1)));
       for (int column = 0; column < 3; ++column) {
         std::vector<std::uint64_t> histogram(std::size_t{kTop} + 1);
-        for (int i = 0; i < 64; ++i) {
-          ++histogram[static_cast<std::size_t>(level(column * 8 + i % 8, i / 8, 0))];
+        for (int i = 0; i < tile * tile; ++i) {
+          ++histogram[static_cast<std::size_t>(level(column * tile + i % tile, i / tile, 0))];
         }
         int low = 0;
         int high = 0;
@@ -345,8 +346,10 @@ void ExpectTrimsTheWholeHistogram(int depth) {
 }
 
 TEST(GeoLUTMatrix, TrimsTilesLikeTheirWholeHistograms) {
-  ExpectTrimsTheWholeHistogram<std::uint8_t>(8);
-  ExpectTrimsTheWholeHistogram<std::uint16_t>(16);
+  for (const int tile : {8, 46}) {
+    ExpectTrimsTheWholeHistogram<std::uint8_t>(8, tile);
+    ExpectTrimsTheWholeHistogram<std::uint16_t>(16, tile);
+  }
 }
 
 TEST(GeoLUTMatrix, RefusesImagesThatDoNotFit) {
