@@ -17,9 +17,9 @@
 #include "apps/zarn/enhancement/sourcereader.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/imagefilter.h"
-#include "apps/zarn/progress.h"
 #include "apps/zarn/stagingfolder.h"
 #include "host/core/exception.h"
+#include "host/nspio/counter.h"
 #include "processes/filters/enhancement/glut.h"
 #include "processes/filters/enhancement/trimmethod.h"
 #include "processes/filters/framework/nodata.h"
@@ -92,7 +92,8 @@ std::vector<float> MaxGains(const EnhanceOptions& options, std::size_t channels)
 }
 
 MatrixPtr MakeMatrix(const EnhanceOptions& options, const RasterSource& source,
-                     const NoDataValues& noData, const StagingFolder* diagnostic) {
+                     const NoDataValues& noData, const StagingFolder* diagnostic,
+                     nspio::Counter& progress) {
   std::vector<float> maxGains;
   if (!options.maxGain.empty()) maxGains = MaxGains(options, source.Channels().size());
   MatrixPtr matrix(filters::GLUT::GetGLUTMatrix(ParametersFor(options, source)));
@@ -100,7 +101,6 @@ MatrixPtr MakeMatrix(const EnhanceOptions& options, const RasterSource& source,
   std::optional<MaskFile> mask;
   if (!options.image.mask.empty()) mask.emplace(options.image.mask, source);
   SourceReader reader(source, noData, mask ? &*mask : nullptr);
-  TerminalProgress progress(options.image.quiet);
   matrix->SetHostData(&progress);
   matrix->LoadFromImage(reader);
   matrix->SetHostData(nullptr);
@@ -159,20 +159,21 @@ void Run(const EnhanceOptions& options) {
     }
     diagnostic.emplace(options.diagnostic, options.image.output.overwrite);
   }
-  RunImageFilter(options.image,
-                 {.probe = [](const RasterSource&) { return RequireBytesOrWords; },
-                  .fit =
-                      [&](const RasterSource& source, const NoDataValues& noData) {
-                        const MatrixPtr matrix = MakeMatrix(options, source, noData,
-                                                            diagnostic ? &*diagnostic : nullptr);
-                        FittedFilter fitted;
-                        fitted.filter =
-                            source.Type().Bytes() == 1
-                                ? EnhanceWindows<std::uint8_t>(*matrix, options, noData)
-                                : EnhanceWindows<std::uint16_t>(*matrix, options, noData);
-                        fitted.marksNoData = true;
-                        return fitted;
-                      }});
+  RunImageFilter(
+      options.image,
+      {.probe = [](const RasterSource&) { return RequireBytesOrWords; },
+       .fit =
+           [&](const RasterSource& source, const NoDataValues& noData, nspio::Counter& progress) {
+             const MatrixPtr matrix =
+                 MakeMatrix(options, source, noData, diagnostic ? &*diagnostic : nullptr, progress);
+             FittedFilter fitted;
+             fitted.filter = source.Type().Bytes() == 1
+                                 ? EnhanceWindows<std::uint8_t>(*matrix, options, noData)
+                                 : EnhanceWindows<std::uint16_t>(*matrix, options, noData);
+             fitted.marksNoData = true;
+             return fitted;
+           },
+       .fittingShare = 0.4});
   if (diagnostic) diagnostic->Publish();
 }
 

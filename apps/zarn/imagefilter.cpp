@@ -158,7 +158,14 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
 
   // First, because fitting may read the whole image.
   StagedOutput output(options.output, source, noData.output);
-  const FittedFilter fitted = maker.fit(source, noData);
+  const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
+                                                        : sys::OMPGetMaxThreads());
+  TerminalProgress progress(options.quiet);
+  const double filtered = output.CopiesAtTheEnd() ? 0.5 : 0.99;
+  ProgressSpan fitting(progress, 0, maker.fittingShare * filtered);
+  ProgressSpan filtering(progress, maker.fittingShare * filtered, filtered);
+  ProgressSpan publishing(progress, filtered, 1);
+  const FittedFilter fitted = maker.fit(source, noData, fitting);
   BlockReader reader(source, noData,
                      {.halo = fitted.halo,
                       .mask = mask ? &*mask : nullptr,
@@ -182,11 +189,6 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
        .forced = forcedWindow});
   FitBlockCache(source, plan, fitted.halo);
 
-  const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
-                                                        : sys::OMPGetMaxThreads());
-  TerminalProgress progress(options.quiet);
-  ProgressSpan filtering(progress, 0, output.CopiesAtTheEnd() ? 0.5 : 0.99);
-  ProgressSpan publishing(progress, output.CopiesAtTheEnd() ? 0.5 : 0.99, 1);
   StreamWindows(
       source, plan, reader,
       [&](const WindowBlocks& blocks) {

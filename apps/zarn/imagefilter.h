@@ -16,6 +16,7 @@
 #include "apps/zarn/stagedoutput.h"
 #include "apps/zarn/streamer.h"
 #include "apps/zarn/windows.h"
+#include "host/nspio/counter.h"
 #include "processes/filters/framework/filterresult.h"
 #include "processes/filters/framework/ifilter.h"
 
@@ -88,11 +89,13 @@ struct FilterMaker {
   /// A filter of the same kind that needs no halo and no labels. It is asked for the image's sample
   /// type, which the filters themselves know best, before anything is written.
   std::function<WindowFilter(const RasterSource&)> probe;
-  /// The filter that does the work.
-  std::function<FittedFilter(const RasterSource&, const NoDataValues&)> fit;
+  /// The filter that does the work; tells how far it is if `fittingShare` is above 0.
+  std::function<FittedFilter(const RasterSource&, const NoDataValues&, nspio::Counter&)> fit;
   /// Whether the filter computes with samples as amounts. Else a palette is no hindrance, and
   /// no-data values are values like all others; the output declares those of the input.
   bool computes = true;
+  /// What fitting takes of the time that it and the filtering take together.
+  double fittingShare = 0;
 };
 
 /// Filters the input file into the output file. Throws `UsageError` and `RunError`.

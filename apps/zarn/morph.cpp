@@ -172,18 +172,18 @@ WindowFilter OnWindows(const MorphOptions& options, const Kernel& kernel) {
 }
 
 void Run(const MorphOptions& options) {
-  RunImageFilter(options.image, {.probe =
-                                     [&](const RasterSource& source) {
-                                       return OnWindows(options, options.kernel.For(source));
-                                     },
-                                 .fit =
-                                     [&](const RasterSource& source, const NoDataValues&) {
-                                       const int steps = options.HasTwoSteps() ? 2 : 1;
-                                       return FittedFilter{
-                                           OnWindows(options, options.kernel.For(source)),
-                                           options.kernel.Halo(source, steps)};
-                                     },
-                                 .computes = false});
+  RunImageFilter(options.image,
+                 {.probe =
+                      [&](const RasterSource& source) {
+                        return OnWindows(options, options.kernel.For(source));
+                      },
+                  .fit =
+                      [&](const RasterSource& source, const NoDataValues&, nspio::Counter&) {
+                        const int steps = options.HasTwoSteps() ? 2 : 1;
+                        return FittedFilter{OnWindows(options, options.kernel.For(source)),
+                                            options.kernel.Halo(source, steps)};
+                      },
+                  .computes = false});
 }
 
 }  // namespace

@@ -26,7 +26,7 @@ void Run(const NeighbourhoodOptions& options, const NeighbourhoodFilterMaker& ma
       options.image,
       {.probe = [&](const RasterSource&) { return OnWindows(makeFilter(1, 0), {}); },
        .fit =
-           [&](const RasterSource& source, const NoDataValues& noData) {
+           [&](const RasterSource& source, const NoDataValues& noData, nspio::Counter&) {
              const int size = ClampedSize(options.size, source);
              const auto background = findBackground(source, noData);
              return FittedFilter{OnWindows(makeFilter(size, background), noData), size / 2};

@@ -42,7 +42,7 @@ void RunPointFilter(const ImageFilterOptions& options, const PointFilterMaker& m
   RunImageFilter(options,
                  {.probe = [&](const RasterSource& source) { return OnWindows(make(source), {}); },
                   .fit =
-                      [&](const RasterSource& source, const NoDataValues& noData) {
+                      [&](const RasterSource& source, const NoDataValues& noData, nspio::Counter&) {
                         if (check) check(source, noData);
                         return FittedFilter{OnWindows(make(source), noData)};
                       }});

@@ -76,21 +76,21 @@ int ClampedSize(std::int64_t size, const RasterSource& source) {
 }
 
 void Run(const NeighbourhoodOptions& options) {
-  RunImageFilter(options.image, {.probe = [](const RasterSource&) { return OnLargerWindows(1, 0); },
-                                 .fit =
-                                     [&](const RasterSource& source, const NoDataValues& noData) {
-                                       const int size = ClampedSize(options.size, source);
-                                       FittedFilter fitted;
-                                       fitted.filter = OnLargerWindows(
-                                           size, RequireBackground(options, source, noData));
-                                       fitted.halo = BlobWindows::Halo(size / 2);
-                                       fitted.filterBytes =
-                                           source.Channels().size() * source.Type().Bytes();
-                                       // No-data pixels are not data here: a blob that they
-                                       // surround is one.
-                                       fitted.marksNoData = true;
-                                       return fitted;
-                                     }});
+  RunImageFilter(options.image,
+                 {.probe = [](const RasterSource&) { return OnLargerWindows(1, 0); },
+                  .fit =
+                      [&](const RasterSource& source, const NoDataValues& noData, nspio::Counter&) {
+                        const int size = ClampedSize(options.size, source);
+                        FittedFilter fitted;
+                        fitted.filter =
+                            OnLargerWindows(size, RequireBackground(options, source, noData));
+                        fitted.halo = BlobWindows::Halo(size / 2);
+                        fitted.filterBytes = source.Channels().size() * source.Type().Bytes();
+                        // No-data pixels are not data here: a blob that they
+                        // surround is one.
+                        fitted.marksNoData = true;
+                        return fitted;
+                      }});
 }
 
 }  // namespace

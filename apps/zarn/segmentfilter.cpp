@@ -93,8 +93,8 @@ void Run(const SegmentFilterOptions& options) {
   RunImageFilter(
       options.image,
       {.probe = [&](const RasterSource&) { return OnWindows(MakeFilter(options, kOnePixel)); },
-       .fit = [&](const RasterSource& source,
-                  const NoDataValues&) { return FitFilter(options, source); }});
+       .fit = [&](const RasterSource& source, const NoDataValues&,
+                  nspio::Counter&) { return FitFilter(options, source); }});
 }
 
 }  // namespace

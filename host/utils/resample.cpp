@@ -354,9 +354,14 @@ class InterpolatedRows {
   // The end of the pixels from i on of which the same has become.
   std::ptrdiff_t EndOfState(std::ptrdiff_t i, std::ptrdiff_t count) const {
     const RunPixel* const states = states_.data();
-    return std::find_if(states + i, states + count,
-                        [state = states[i]](RunPixel other) { return other != state; }) -
-           states;
+    const RunPixel state = states[i];
+    // Mostly all are done.
+    std::array<RunPixel, 8> same;
+    same.fill(state);
+    for (; i + 8 <= count && std::memcmp(states + i, same.data(), 8) == 0; i += 8) {
+    }
+    while (i < count && states[i] == state) ++i;
+    return i;
   }
 
   // Whether a pixel of the run may be the no-data value, going by all samples alike.

@@ -16,36 +16,32 @@ using filters::PowerCurve;
 
 constexpr std::size_t kByteLevels = 256;
 
-// Samples of one channel as numbers.
-template <typename T>
-void TakeLevels(const T* samples, std::size_t channels, std::size_t count, std::int32_t* levels) {
-  for (std::size_t i = 0; i < count; ++i) levels[i] = samples[i * channels];
+inline float Between(float first, float second, float weight) {
+  return first + (second - first) * weight;
 }
 
-template <typename T>
-void PutLevels(const std::int32_t* levels, const std::uint8_t* valid, std::size_t channels,
-               std::size_t count, T* samples) {
-  if (valid == nullptr) {
-    for (std::size_t i = 0; i < count; ++i) samples[i * channels] = static_cast<T>(levels[i]);
-    return;
-  }
-  for (std::size_t i = 0; i < count; ++i) {
-    T& sample = samples[i * channels];
-    sample = valid[i] != 0 ? static_cast<T>(levels[i]) : sample;
-  }
+// `filters::CurveValue`, as a number and without branches.
+inline float Value(const PowerCurve& curve, float top, std::int32_t level, float power) {
+  const float least = level >= curve.high ? top : 0.0F;
+  float value = curve.gain * power;
+  value = value > least ? value : least;  // not so for NaN
+  value = value < top ? value : top;
+  return static_cast<float>(static_cast<std::int32_t>(value));
 }
 
-// The powers of the levels above the beginnings of four curves; below them that of 0. Apart from
-// the arithmetic, because the compiler does not vectorise what has look-ups in it.
-void LookUpPowers(const std::array<PowerCurve, 4>& curves, const float* table,
-                  const std::int32_t* levels, std::size_t count, float* powers, std::size_t pitch) {
-  const std::array<std::int32_t, 4> lows{curves[0].low, curves[1].low, curves[2].low,
-                                         curves[3].low};
+// Levels as numbers and their entries in four tables. Apart from the arithmetic, because the
+// compiler does not vectorise what has look-ups in it.
+template <typename T>
+void LookUpPowers(const std::array<const float*, 4>& tables, const T* samples, std::size_t channels,
+                  std::size_t count, std::int32_t* levels, float* powers, std::size_t pitch) {
+  const auto [first, second, third, fourth] = tables;
   for (std::size_t i = 0; i < count; ++i) {
-    const std::int32_t level = levels[i];
-    for (std::size_t k = 0; k < 4; ++k) {
-      powers[k * pitch + i] = table[level > lows[k] ? level - lows[k] : 0];
-    }
+    const T level = samples[i * channels];
+    levels[i] = level;
+    powers[i] = first[level];
+    powers[pitch + i] = second[level];
+    powers[2 * pitch + i] = third[level];
+    powers[3 * pitch + i] = fourth[level];
   }
 }
 
@@ -60,30 +56,54 @@ void LookUpPairs(const float* left, const float* right, const T* samples, std::s
   }
 }
 
-// `filters::CurveValue`, as a number and without branches, in the place of the powers.
-ZARN_VECTORISED void CurveValues(const PowerCurve& curve, float top, const std::int32_t* levels,
-                                 std::size_t count, float* values) {
-  const float gain = curve.gain;
-  const std::int32_t high = curve.high;
-  for (std::size_t i = 0; i < count; ++i) {
-    const float least = levels[i] >= high ? top : 0.0F;
-    float value = gain * values[i];
-    value = value > least ? value : least;  // not so for NaN
-    value = value < top ? value : top;
-    values[i] = static_cast<float>(static_cast<std::int32_t>(value));
+template <typename T>
+void PutLevels(const std::int32_t* levels, const std::uint8_t* valid, std::size_t channels,
+               std::size_t count, T* samples) {
+  if (valid == nullptr && channels == 1) {  // the compiler vectorises this one
+    for (std::size_t i = 0; i < count; ++i) samples[i] = static_cast<T>(levels[i]);
+    return;
   }
+  if (valid == nullptr) {
+    for (std::size_t i = 0; i < count; ++i) samples[i * channels] = static_cast<T>(levels[i]);
+    return;
+  }
+  for (std::size_t i = 0; i < count; ++i) {
+    T& sample = samples[i * channels];
+    sample = valid[i] != 0 ? static_cast<T>(levels[i]) : sample;
+  }
+}
+
+ZARN_VECTORISED void CurveValues(const PowerCurve& curve, float top, const std::int32_t* levels,
+                                 const float* powers, std::size_t count, float* values) {
+  const PowerCurve own = curve;
+  for (std::size_t i = 0; i < count; ++i) values[i] = Value(own, top, levels[i], powers[i]);
 }
 
 // What lies between two rows of values, at `weight` of the way.
 ZARN_VECTORISED void BlendRows(const float* above, const float* below, float weight,
                                std::size_t count, float* blended) {
-  for (std::size_t i = 0; i < count; ++i) blended[i] = above[i] + (below[i] - above[i]) * weight;
+  for (std::size_t i = 0; i < count; ++i) blended[i] = Between(above[i], below[i], weight);
 }
 
 ZARN_VECTORISED void BlendColumns(const float* left, const float* right, const float* weights,
                                   std::size_t count, std::int32_t* results) {
   for (std::size_t i = 0; i < count; ++i) {
-    results[i] = static_cast<std::int32_t>(left[i] + (right[i] - left[i]) * weights[i] + 0.5F);
+    results[i] = static_cast<std::int32_t>(Between(left[i], right[i], weights[i]) + 0.5F);
+  }
+}
+
+// All of it at once.
+ZARN_VECTORISED void BlendCurves(const std::array<PowerCurve, 4>& curves, float top,
+                                 const std::int32_t* levels, const float* powers, std::size_t pitch,
+                                 float rowWeight, const float* weights, std::size_t count,
+                                 std::int32_t* results) {
+  const std::array<PowerCurve, 4> own = curves;
+  for (std::size_t i = 0; i < count; ++i) {
+    const float left = Between(Value(own[0], top, levels[i], powers[i]),
+                               Value(own[1], top, levels[i], powers[pitch + i]), rowWeight);
+    const float right = Between(Value(own[2], top, levels[i], powers[2 * pitch + i]),
+                                Value(own[3], top, levels[i], powers[3 * pitch + i]), rowWeight);
+    results[i] = static_cast<std::int32_t>(Between(left, right, weights[i]) + 0.5F);
   }
 }
 
@@ -123,7 +143,7 @@ struct CurveField<T>::Axis {
 template <typename T>
 struct CurveField<T>::Scratch {
   explicit Scratch(std::size_t width)
-      : pitch(std::max(width, kByteLevels)), levels(pitch), floats(8 * pitch) {}
+      : pitch(std::max(width, kByteLevels)), levels(pitch), results(pitch), floats(8 * pitch) {}
   float* Corner(std::size_t corner) { return floats.data() + corner * pitch; }
   float* Left() { return Corner(4); }
   float* Right() { return Corner(5); }
@@ -132,6 +152,7 @@ struct CurveField<T>::Scratch {
 
   std::size_t pitch;
   std::vector<std::int32_t> levels;
+  std::vector<std::int32_t> results;
   std::vector<float> floats;
 };
 
@@ -143,7 +164,9 @@ CurveField<T>::CurveField(const filters::IGeoLUTMatrix& matrix, CellBlending ble
       columns_(static_cast<std::uint32_t>(matrix.GetGridColumns())),
       channels_(static_cast<std::size_t>(matrix.GetChannelCount())),
       blending_(blending),
-      powers_(filters::PowerTable<T>(matrix.GetPower())) {
+      powers_(kLevels) {
+  const std::vector<float> powers = filters::PowerTable<T>(matrix.GetPower());
+  powers_.insert(powers_.end(), powers.begin(), powers.end());
   curves_.reserve(std::size_t{rows_} * columns_ * channels_);
   for (int row = 0; row < matrix.GetGridRows(); ++row) {
     for (int column = 0; column < matrix.GetGridColumns(); ++column) {
@@ -198,56 +221,92 @@ std::array<PowerCurve, 4> CurveField<T>::Corners(const Run& rows, const Run& col
 }
 
 template <typename T>
+std::array<const float*, 4> CurveField<T>::Tables(const std::array<Curve, 4>& curves) const {
+  std::array<const float*, 4> tables{};
+  for (std::size_t k = 0; k < curves.size(); ++k) {
+    tables[k] = powers_.data() + kLevels - static_cast<std::size_t>(curves[k].low);
+  }
+  return tables;
+}
+
+// Each level once for the whole tile.
+template <typename T>
 void CurveField<T>::EnhanceTile(const Block& block, const Axis& rows, const Axis& columns,
                                 const Run& rowRun, const Run& columnRun, std::size_t channel,
                                 Scratch& scratch) const {
-  constexpr bool kTabulates = sizeof(T) == 1;  // each level once for the whole tile
-  constexpr auto kTop = static_cast<float>(filters::kTopLevel<T>);
+  static constexpr auto kAllLevels = [] {
+    std::array<T, kByteLevels> levels{};
+    std::iota(levels.begin(), levels.end(), T{0});
+    return levels;
+  }();
   const std::array<Curve, 4> curves = Corners(rowRun, columnRun, channel);
-  const std::size_t width = columnRun.end - columnRun.begin;
-  std::int32_t* const levels = scratch.levels.data();
-  const auto evaluate = [&](std::size_t count) {
-    LookUpPowers(curves, powers_.data(), levels, count, scratch.Corner(0), scratch.pitch);
-    for (std::size_t k = 0; k < curves.size(); ++k) {
-      CurveValues(curves[k], kTop, levels, count, scratch.Corner(k));
-    }
-  };
-  const auto blendRows = [&](float weight, std::size_t count) {
-    BlendRows(scratch.Corner(0), scratch.Corner(1), weight, count, scratch.Left());
-    BlendRows(scratch.Corner(2), scratch.Corner(3), weight, count, scratch.Right());
-  };
-  if constexpr (kTabulates) {
-    std::iota(levels, levels + kByteLevels, 0);
-    evaluate(kByteLevels);
+  // Outside these levels all four agree.
+  const auto from = static_cast<std::size_t>(
+      std::min({curves[0].low, curves[1].low, curves[2].low, curves[3].low}));
+  const auto to = static_cast<std::size_t>(
+      std::max({curves[0].high, curves[1].high, curves[2].high, curves[3].high}));
+  LookUpPowers(Tables(curves), kAllLevels.data() + from, 1, to - from, scratch.levels.data(),
+               scratch.Corner(0), scratch.pitch);
+  for (std::size_t k = 0; k < curves.size(); ++k) {
+    CurveValues(curves[k], kTop, scratch.levels.data(), scratch.Corner(k), to - from,
+                scratch.Corner(k));
   }
-  const float* const left = kTabulates ? scratch.LeftOfPixels() : scratch.Left();
-  const float* const right = kTabulates ? scratch.RightOfPixels() : scratch.Right();
+  for (float* const row : {scratch.Left(), scratch.Right()}) {
+    std::fill(row, row + from, 0.0F);
+    std::fill(row + to, row + kByteLevels, kTop);
+  }
+  const std::size_t width = columnRun.end - columnRun.begin;
   for (std::size_t y = rowRun.begin; y < rowRun.end; ++y) {
     const std::size_t first = y * block.width + columnRun.begin;
-    const T* const samples = block.samples + first * channels_ + channel;
-    if constexpr (kTabulates) {
-      blendRows(rows.weights[y], kByteLevels);
-      LookUpPairs(scratch.Left(), scratch.Right(), samples, channels_, width,
-                  scratch.LeftOfPixels(), scratch.RightOfPixels());
-    } else {
-      TakeLevels(samples, channels_, width, levels);
-      evaluate(width);
-      blendRows(rows.weights[y], width);
+    BlendRows(scratch.Corner(0), scratch.Corner(1), rows.weights[y], to - from,
+              scratch.Left() + from);
+    BlendRows(scratch.Corner(2), scratch.Corner(3), rows.weights[y], to - from,
+              scratch.Right() + from);
+    LookUpPairs(scratch.Left(), scratch.Right(), block.samples + first * channels_ + channel,
+                channels_, width, scratch.LeftOfPixels(), scratch.RightOfPixels());
+    BlendColumns(scratch.LeftOfPixels(), scratch.RightOfPixels(),
+                 columns.weights.data() + columnRun.begin, width, scratch.results.data());
+    PutLevels(scratch.results.data(), block.valid == nullptr ? nullptr : block.valid + first,
+              channels_, width, block.results + first * channels_ + channel);
+  }
+}
+
+// Each pixel by itself.
+template <typename T>
+void CurveField<T>::EnhanceRow(const Block& block, std::size_t y, const Run& rowRun,
+                               float rowWeight, const Axis& columns, Scratch& scratch) const {
+  std::int32_t* const levels = scratch.levels.data();
+  std::int32_t* const results = scratch.results.data();
+  for (const Run& run : columns.runs) {
+    const std::size_t width = run.end - run.begin;
+    const std::size_t first = y * block.width + run.begin;
+    const std::uint8_t* const valid = block.valid == nullptr ? nullptr : block.valid + first;
+    for (std::size_t c = 0; c < channels_; ++c) {
+      const std::array<Curve, 4> curves = Corners(rowRun, run, c);
+      LookUpPowers(Tables(curves), block.samples + first * channels_ + c, channels_, width, levels,
+                   scratch.Corner(0), scratch.pitch);
+      BlendCurves(curves, kTop, levels, scratch.Corner(0), scratch.pitch, rowWeight,
+                  columns.weights.data() + run.begin, width, results);
+      PutLevels(results, valid, channels_, width, block.results + first * channels_ + c);
     }
-    BlendColumns(left, right, columns.weights.data() + columnRun.begin, width, levels);
-    PutLevels(levels, block.valid == nullptr ? nullptr : block.valid + first, channels_, width,
-              block.results + first * channels_ + channel);
   }
 }
 
 template <typename T>
 void CurveField<T>::EnhanceRows(const Block& block, const Axis& rows, const Axis& columns,
                                 std::size_t begin, std::size_t end, Scratch& scratch) const {
+  const bool tabulates = sizeof(T) == 1 && std::size_t{tileWidth_} * tileHeight_ >= kByteLevels;
   for (const Run& run : rows.runs) {
     Run part = run;
     part.begin = std::max(part.begin, begin);
     part.end = std::min(part.end, end);
     if (part.begin >= part.end) continue;
+    if (!tabulates) {
+      for (std::size_t y = part.begin; y < part.end; ++y) {
+        EnhanceRow(block, y, part, rows.weights[y], columns, scratch);
+      }
+      continue;
+    }
     for (const Run& columnRun : columns.runs) {
       for (std::size_t c = 0; c < channels_; ++c) {
         EnhanceTile(block, rows, columns, part, columnRun, c, scratch);

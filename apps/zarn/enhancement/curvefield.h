@@ -45,10 +45,17 @@ class CurveField {
   Axis PlaceAlong(std::uint64_t origin, std::size_t count, std::uint32_t tile,
                   std::uint32_t cells) const;
   std::array<Curve, 4> Corners(const Run& rows, const Run& columns, std::size_t channel) const;
+  /// The powers of the levels above the beginnings of curves; below them that of 0.
+  std::array<const float*, 4> Tables(const std::array<Curve, 4>& curves) const;
   void EnhanceRows(const Block& block, const Axis& rows, const Axis& columns, std::size_t begin,
                    std::size_t end, Scratch& scratch) const;
   void EnhanceTile(const Block& block, const Axis& rows, const Axis& columns, const Run& rowRun,
                    const Run& columnRun, std::size_t channel, Scratch& scratch) const;
+  void EnhanceRow(const Block& block, std::size_t y, const Run& rowRun, float rowWeight,
+                  const Axis& columns, Scratch& scratch) const;
+
+  static constexpr std::size_t kLevels = std::size_t{1} << 8 * sizeof(T);
+  static constexpr auto kTop = static_cast<float>(kLevels - 1);
 
   std::uint32_t tileWidth_;
   std::uint32_t tileHeight_;
@@ -56,7 +63,7 @@ class CurveField {
   std::uint32_t columns_;
   std::size_t channels_;
   CellBlending blending_;
-  std::vector<float> powers_;
+  std::vector<float> powers_;  ///< of the levels, after as many zeros
   std::vector<Curve> curves_;  ///< cell by cell, the channels of each
 };
 

@@ -1,6 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
+#include <future>
+
 #include "apps/zarn/blockreader.h"
 #include "apps/zarn/dataset.h"
 #include "apps/zarn/maskfile.h"
@@ -12,6 +15,9 @@ namespace zarn::app {
 
 /// The channels of a raster file for the library. Valid are pixels that are not no-data, NaN,
 /// transparent or masked.
+///
+/// While the caller works on a block, the next one is read by another thread: that on the right of
+/// the same size or, at the end of a row of blocks, the first one below.
 class SourceReader : public datasources::IRasterReader {
  public:
   /// All are borrowed; `mask` may be null.
@@ -30,9 +36,13 @@ class SourceReader : public datasources::IRasterReader {
   void Read(gobs::Raster& block, std::uint8_t* valid) override;
 
  private:
+  void ReadAhead(const Window& window);
+
   const RasterSource& source_;
   BlockReader reader_;
-  WindowBuffers buffers_;
+  std::array<WindowBuffers, 2> buffers_;  ///< of the block asked for and of the next one
+  Window rowOfBlocks_;                    ///< its first block
+  std::future<void> ahead_;               ///< waits when it is destroyed
 };
 
 }  // namespace zarn::app

@@ -44,8 +44,7 @@ class CellEstimator {
                       std::uint64_t* histogram) const;
 
  private:
-  bool SetStretch(const std::uint64_t* histogram, CellGrid& grid, std::size_t cell,
-                  int channel) const;
+  bool SetStretch(const HistogramBins& bins, CellGrid& grid, std::size_t cell, int channel) const;
 
   const GLUTParameters& parameters_;
   const ITrimMethod& trim_;

@@ -24,6 +24,73 @@ std::int64_t Quotient(std::int64_t a, std::int64_t b) {
   return a / b;
 }
 
+// By shares of the pixels.
+void TrimTails(const HistogramBins& bins, double leftTrim, double rightTrim, bool ignoreFirstBin,
+               bool ignoreLastBin, std::int64_t total, int& low, int& high) {
+  low = FirstBin(ignoreFirstBin);
+  high = LastBin(bins.count, ignoreLastBin);
+  if (leftTrim == 0.0 && rightTrim == 0.0) return;
+  const auto begin = static_cast<int>(bins.begin);
+  const auto end = static_cast<int>(bins.end);
+  auto pixels = static_cast<double>(total);
+  if (total == -1) {
+    std::uint64_t sum = 0;
+    for (int i = std::max(low, begin); i <= std::min(high, end - 1); ++i) sum += bins.histogram[i];
+    pixels = static_cast<double>(sum);
+  }
+  // Empty bins are cut off, unless nothing may be. Passing over them keeps the subtractions, each
+  // of which waits for the one before, few.
+  const auto isKept = [&](int bin, double& remaining) {
+    if (bins.histogram[bin] == 0) return false;
+    remaining -= static_cast<double>(bins.histogram[bin]);
+    return remaining < 0.0;
+  };
+  // Up to the end of the histogram, past `high` if need be.
+  double remaining = pixels * leftTrim + 0.5;
+  if (!(remaining < 0.0)) {
+    low = std::max(low, begin);
+    while (low < end && !isKept(low, remaining)) ++low;
+    if (low >= end) low = std::max(low, static_cast<int>(bins.count));
+  }
+  remaining = pixels * rightTrim + 0.5;
+  if (!(remaining < 0.0)) {
+    high = std::min(high, end - 1);
+    while (high >= begin && !isKept(high, remaining)) --high;
+    if (high < begin) high = std::min(high, -1);
+  }
+}
+
+// By deviations around the mean.
+void TrimDeviating(const HistogramBins& bins, double leftTrim, double rightTrim,
+                   bool ignoreFirstBin, bool ignoreLastBin, int& low, int& high) {
+  low = FirstBin(ignoreFirstBin);
+  high = LastBin(bins.count, ignoreLastBin);
+  std::uint64_t pixels = 0;
+  std::uint64_t sum = 0;
+  std::uint64_t squares = 0;
+  const unsigned int end = ignoreLastBin && bins.count > 0 ? bins.count - 1 : bins.count;
+  for (unsigned int i = std::max(static_cast<unsigned int>(low), bins.begin);
+       i < std::min(end, bins.end); ++i) {
+    pixels += bins.histogram[i];
+    sum += i * bins.histogram[i];
+    const unsigned int square = i * i;  // in 32 bits
+    squares += square * bins.histogram[i];
+  }
+  const std::int64_t n = AsSigned(pixels);
+  if (n == 0) return;
+  const std::int64_t mean = Quotient(AsSigned(sum), n);
+  const auto meanBits = static_cast<std::uint64_t>(mean);
+  const auto variance =
+      AsSigned(static_cast<std::uint64_t>(Quotient(AsSigned(squares), n)) - meanBits * meanBits);
+  const int sigma =
+      gobs::SaturateCast<int>(static_cast<double>(std::sqrt(static_cast<float>(variance))));
+  low = gobs::SaturateCast<int>(static_cast<double>(mean) - sigma * leftTrim);
+  high = gobs::SaturateCast<int>(sigma * rightTrim + static_cast<double>(mean));
+  if (low < 0) low = 0;
+  const auto count = static_cast<int>(bins.count);
+  if (high >= count) high = count - 1;
+}
+
 }  // namespace
 
 TrimMethod StringToTrimMethod(std::string text) {
@@ -43,54 +110,24 @@ std::string TrimMethodToString(TrimMethod method) {
 void PercentTrimMethod::Trim(const std::uint64_t* histogram, double leftTrim, double rightTrim,
                              unsigned int binCount, bool ignoreFirstBin, bool ignoreLastBin,
                              std::int64_t total, int& low, int& high) const {
-  low = FirstBin(ignoreFirstBin);
-  high = LastBin(binCount, ignoreLastBin);
-  if (leftTrim == 0.0 && rightTrim == 0.0) return;
-  auto pixels = static_cast<double>(total);
-  if (total == -1) {
-    std::uint64_t sum = 0;
-    for (int i = low; i <= high; ++i) sum += histogram[i];
-    pixels = static_cast<double>(sum);
-  }
-  const auto isKept = [&](int bin, double& remaining) {
-    remaining -= static_cast<double>(histogram[bin]);
-    return remaining < 0.0;
-  };
-  // Up to the end of the histogram, past `high` if need be.
-  double remaining = pixels * leftTrim + 0.5;
-  while (static_cast<unsigned int>(low) < binCount && !isKept(low, remaining)) ++low;
-  remaining = pixels * rightTrim + 0.5;
-  while (high >= 0 && !isKept(high, remaining)) --high;
+  TrimTails({histogram, binCount, 0, binCount}, leftTrim, rightTrim, ignoreFirstBin, ignoreLastBin,
+            total, low, high);
 }
 
 void MeanNSigmaTrimMethod::Trim(const std::uint64_t* histogram, double leftTrim, double rightTrim,
                                 unsigned int binCount, bool ignoreFirstBin, bool ignoreLastBin,
                                 std::int64_t /*total*/, int& low, int& high) const {
-  low = FirstBin(ignoreFirstBin);
-  high = LastBin(binCount, ignoreLastBin);
-  std::uint64_t pixels = 0;
-  std::uint64_t sum = 0;
-  std::uint64_t squares = 0;
-  const unsigned int end = ignoreLastBin && binCount > 0 ? binCount - 1 : binCount;
-  for (auto i = static_cast<unsigned int>(low); i < end; ++i) {
-    pixels += histogram[i];
-    sum += i * histogram[i];
-    const unsigned int square = i * i;  // in 32 bits
-    squares += square * histogram[i];
+  TrimDeviating({histogram, binCount, 0, binCount}, leftTrim, rightTrim, ignoreFirstBin,
+                ignoreLastBin, low, high);
+}
+
+void Trim(const ITrimMethod& method, const HistogramBins& bins, double leftTrim, double rightTrim,
+          bool ignoreFirstBin, bool ignoreLastBin, int& low, int& high) {
+  if (method.GetMethod() == static_cast<int>(TrimMethod::kPercentage)) {
+    TrimTails(bins, leftTrim, rightTrim, ignoreFirstBin, ignoreLastBin, -1, low, high);
+  } else {
+    TrimDeviating(bins, leftTrim, rightTrim, ignoreFirstBin, ignoreLastBin, low, high);
   }
-  const std::int64_t n = AsSigned(pixels);
-  if (n == 0) return;
-  const std::int64_t mean = Quotient(AsSigned(sum), n);
-  const auto meanBits = static_cast<std::uint64_t>(mean);
-  const auto variance =
-      AsSigned(static_cast<std::uint64_t>(Quotient(AsSigned(squares), n)) - meanBits * meanBits);
-  const int sigma =
-      gobs::SaturateCast<int>(static_cast<double>(std::sqrt(static_cast<float>(variance))));
-  low = gobs::SaturateCast<int>(static_cast<double>(mean) - sigma * leftTrim);
-  high = gobs::SaturateCast<int>(sigma * rightTrim + static_cast<double>(mean));
-  if (low < 0) low = 0;
-  const auto bins = static_cast<int>(binCount);
-  if (high >= bins) high = bins - 1;
 }
 
 ITrimMethod* CreateTrimMethod(TrimMethod method) {

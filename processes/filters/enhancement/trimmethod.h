@@ -65,6 +65,19 @@ class MeanNSigmaTrimMethod final  // NOLINT(cppcoreguidelines-virtual-class-dest
   int GetMethod() const override { return static_cast<int>(TrimMethod::kMeanNSigma); }
 };
 
+/// A histogram of `count` bins of which those outside `begin` .. `end` - 1 are empty.
+struct HistogramBins {
+  const std::uint64_t* histogram;
+  unsigned int count;
+  unsigned int begin;
+  unsigned int end;
+};
+
+/// `ITrimMethod::Trim` of one of the two methods, with the pixels counted, in a time that does not
+/// depend on the empty bins.
+void Trim(const ITrimMethod& method, const HistogramBins& bins, double leftTrim, double rightTrim,
+          bool ignoreFirstBin, bool ignoreLastBin, int& low, int& high);
+
 /// A new object of the method, or null for an unknown one. The caller owns it: see
 /// `TrimMethodDeleter`.
 ZARN_FILTERS_EXPORT ITrimMethod* CreateTrimMethod(TrimMethod method);

@@ -292,6 +292,66 @@ TEST(GeoLUTMatrix, LoadsStretchesFromTheTilesOfAnImage) {
   ExpectLoads<std::uint16_t>(16, 900);
 }
 
+// The levels of tiles lie together, so that most of a histogram is empty; some of the pixels have
+// the lowest and the highest level.
+template <typename T>
+void ExpectTrimsTheWholeHistogram(int depth, int tile) {
+  constexpr int kTop = std::numeric_limits<T>::max();
+  const auto level = [&](int x, int y, int) {
+    const int grain = (x * 31 + y * 57 + x * y) % 41;
+    if (x >= tile && grain % 5 == 0) return x >= 2 * tile ? kTop : 0;
+    return kTop / 3 + grain;
+  };
+  MemoryRaster image;
+  FillImage<T>(3 * tile, tile, 1, level, image);
+  for (const auto& [left, right] : {std::pair(0.02, 0.1),
+                                    {0.0, 0.3},
+                                    {0.7, 0.6},
+                                    {1.0, 0.0},
+                                    {0.0, 0.0},
+                                    {-0.5, 0.2},
+                                    {0.2, -0.5}}) {
+    for (int choice = 0; choice < 8; ++choice) {
+      GLUTParameters parameters = Grid(1, 3, 1, depth);
+      parameters.tileWidth = parameters.tileHeight = tile;
+      parameters.trimMethod = choice & 1;
+      parameters.ignoreFirstBin = (choice & 2) != 0;
+      parameters.ignoreLastBin = (choice & 4) != 0;
+      parameters.leftTrim = left;
+      parameters.rightTrim = right;
+      const MatrixPtr matrix = Make(parameters);
+      matrix->LoadFromImage(image);
+      const TrimMethodPtr trim(CreateTrimMethod(static_cast<TrimMethod>(choice & 1)));
+      for (int column = 0; column < 3; ++column) {
+        std::vector<std::uint64_t> histogram(std::size_t{kTop} + 1);
+        for (int i = 0; i < tile * tile; ++i) {
+          ++histogram[static_cast<std::size_t>(level(column * tile + i % tile, i / tile, 0))];
+        }
+        int low = 0;
+        int high = 0;
+        trim->Trim(histogram.data(), left, right, kTop + 1U, parameters.ignoreFirstBin,
+                   parameters.ignoreLastBin, -1, low, high);
+        const bool hasRange = low >= 0 && low < high && high <= kTop;
+        const auto gain = static_cast<float>(kTop / (high - low + 2.5));
+        float found = 0;
+        float offset = 0;
+        matrix->GetCell(0, column, 0, found, offset);
+        EXPECT_TRUE(matrix->IsValid(0, column) == hasRange &&
+                    (!hasRange || (found == gain && offset == static_cast<float>(low - 1))))
+            << column << ": " << low << " to " << high << ", trims " << left << " and " << right
+            << ", choice " << choice;
+      }
+    }
+  }
+}
+
+TEST(GeoLUTMatrix, TrimsTilesLikeTheirWholeHistograms) {
+  for (const int tile : {8, 46}) {
+    ExpectTrimsTheWholeHistogram<std::uint8_t>(8, tile);
+    ExpectTrimsTheWholeHistogram<std::uint16_t>(16, tile);
+  }
+}
+
 TEST(GeoLUTMatrix, RefusesImagesThatDoNotFit) {
   const auto flat = [](int, int, int) { return 1; };
   MemoryRaster bytes;
