@@ -90,7 +90,9 @@ class GroupVectors {
     for (std::size_t n = 0; n < GroupedEdges::kNumbers; ++n) {
       edges_[n] = grouped.edges[n].data() + near.place;
     }
-    for (std::size_t k = 0; k < near.count; k += hn::Lanes(d)) {
+    const std::size_t part = near.place / GroupedEdges::kPart;
+    const std::size_t parts = (near.count + GroupedEdges::kPart - 1) / GroupedEdges::kPart;
+    for (std::size_t k = 0; k < parts * GroupedEdges::kPart; k += hn::Lanes(d)) {
       const V dx = hn::LoadU(d, edges_[GroupedEdges::kDx] + k);
       const V dy = hn::LoadU(d, edges_[GroupedEdges::kDy] + k);
       const V fromY = hn::Sub(row, hn::LoadU(d, edges_[GroupedEdges::kY0] + k));
@@ -103,10 +105,9 @@ class GroupVectors {
       hn::Store(hn::Mul(fromY, fromY), d, squaredFrom_ + k);
       hn::Store(hn::Mul(toY, toY), d, squaredTo_ + k);
     }
-    const std::size_t part = near.place / GroupedEdges::kPart;
     minX_ = grouped.boxes[GroupedEdges::kMinX].data() + part;
     maxX_ = grouped.boxes[GroupedEdges::kMaxX].data() + part;
-    for (std::size_t p = 0; p < kParts; p += hn::Lanes(d)) {
+    for (std::size_t p = 0; p < parts; p += hn::Lanes(d)) {
       const V minY = hn::LoadU(d, grouped.boxes[GroupedEdges::kMinY].data() + part + p);
       const V maxY = hn::LoadU(d, grouped.boxes[GroupedEdges::kMaxY].data() + part + p);
       const V above = hn::Max(hn::Max(hn::Sub(minY, row), hn::Sub(row, maxY)), hn::Zero(d));
@@ -132,12 +133,10 @@ class GroupVectors {
       best = LowerToEnd(d, k + 3, x, best, below3);
       const V least = hn::Min(hn::Min(below0, below1), hn::Min(below2, below3));
       if (hn::AllTrue(d, hn::Ge(least, best))) continue;
-      // What is sure to be undercut need not be divided.
-      const V most = hn::Min(best, hn::Mul(least, hn::Set(d, 1 + 0x1p-40)));
-      best = LowerAcross(d, k, x, best, hn::Le(below0, most));
-      best = LowerAcross(d, k + 1, x, best, hn::Le(below1, most));
-      best = LowerAcross(d, k + 2, x, best, hn::Le(below2, most));
-      best = LowerAcross(d, k + 3, x, best, hn::Le(below3, most));
+      best = LowerAcross(d, k, x, best, hn::Lt(below0, best));
+      best = LowerAcross(d, k + 1, x, best, hn::Lt(below1, best));
+      best = LowerAcross(d, k + 2, x, best, hn::Lt(below2, best));
+      best = LowerAcross(d, k + 3, x, best, hn::Lt(below3, best));
     }
     return best;
   }
