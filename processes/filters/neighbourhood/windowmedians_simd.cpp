@@ -289,20 +289,18 @@ HWY_ATTR void FindInRow(const KeyWindows<Key>& windows) {
   const SortedColumns<Key> rows{windows.scratch, kTaps, windows.step,
                                 MedianPitch<Key>(kTaps, windows.step)};
   constexpr std::size_t kBlock = kMedianBlockBytes / sizeof(Key);
+  HWY_ALIGN Key rest[HWY_MAX_BYTES / sizeof(Key)] = {};
   for (std::size_t first = 0; first < windows.count; first += kBlock) {
     const std::size_t count = std::min(kBlock, windows.count - first);
     const std::size_t length = count + (kTaps - 1) * windows.step;
     SortColumns<kHoles>(windows, first, length, rows, std::make_index_sequence<kTaps>());
     if constexpr (kTaps > 3) PairColumns(rows, length - windows.step);
     Key* const medians = windows.medians + first;
-    std::size_t i = 0;
-    for (; i + lanes <= count; i += lanes) {
-      hn::StoreU(MedianOfColumns<kTaps, kHoles>(d, rows, i), d, medians + i);
+    const std::size_t whole = count - count % lanes;
+    for (std::size_t i = 0; i < count; i += lanes) {
+      hn::StoreU(MedianOfColumns<kTaps, kHoles>(d, rows, i), d, i < whole ? medians + i : rest);
     }
-    if (i == count) continue;
-    HWY_ALIGN Key rest[HWY_MAX_BYTES / sizeof(Key)];
-    hn::Store(MedianOfColumns<kTaps, kHoles>(d, rows, i), d, rest);
-    std::memcpy(medians + i, rest, (count - i) * sizeof(Key));
+    std::memcpy(medians + whole, rest, (count - whole) * sizeof(Key));
   }
 }
 
