@@ -74,12 +74,13 @@ class ValidityRow {
     }
   }
 
-  void ClearNoData(const T* pixels, std::uint8_t* valid, std::size_t count) const {
+  void ClearNoData(const T* pixels, bool exact, std::uint8_t* valid, std::size_t count) const {
     if (input_.empty()) return;
     for (std::size_t x = 0; x < count; ++x) {
-      if (filters::PixelNearlyEquals(pixels + x * channels_, input_.data(), channels_)) {
-        valid[x] = 0;
-      }
+      const T* const pixel = pixels + x * channels_;
+      const bool isNoData = exact ? filters::PixelEquals(pixel, input_.data(), channels_)
+                                  : filters::PixelNearlyEquals(pixel, input_.data(), channels_);
+      if (isNoData) valid[x] = 0;
     }
   }
 
@@ -298,7 +299,9 @@ void BlockReader::MarkValid(const Fresh& fresh, WindowBuffers& buffers) {
           valid[x] = mask[x] == std::byte{0} ? std::uint8_t{0} : valid[x];
         }
       }
-      if (request_.marksNoData) rules.ClearNoData(samples(y), valid, width);
+      if (request_.marksNoData) {
+        rules.ClearNoData(samples(y), request_.exactNoData, valid, width);
+      }
       rules.TranslateInvalid(valid, samples(y), width);
     });
     if (request_.mask != nullptr) {

@@ -22,6 +22,8 @@ struct BlockRequest {
   MaskFile* outputMask = nullptr;  ///< names pixels that are not to be written
   /// No-data pixels are found here, like all other invalid ones, instead of by the filter.
   bool marksNoData = false;
+  /// These are exactly equal to the no-data value, instead of within the tolerance.
+  bool exactNoData = false;
   /// The filter would write pixels that are not processed from their neighbours, and must not.
   bool protectsInvalid = false;
 };

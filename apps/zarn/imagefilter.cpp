@@ -172,6 +172,7 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
                       .labels = fitted.labels.get(),
                       .outputMask = fitted.outputMask.get(),
                       .marksNoData = fitted.marksNoData,
+                      .exactNoData = fitted.exactNoData,
                       .protectsInvalid = fitted.protectsInvalid});
   BlockWriter writer(source, output.Dataset(), output.Name());
   int blockWidth = 1;

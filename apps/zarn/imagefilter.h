@@ -81,6 +81,7 @@ struct FittedFilter {
   std::unique_ptr<MaskFile> outputMask = nullptr;  ///< names pixels to be left alone, or null
   std::size_t filterBytes = 0;   ///< what the filter itself holds for each pixel of a block
   bool marksNoData = false;      ///< as `BlockRequest` has it
+  bool exactNoData = false;      ///< as `BlockRequest` has it
   bool protectsInvalid = false;  ///< as `BlockRequest` has it
 };
 

@@ -33,6 +33,10 @@ void Run(const NeighbourhoodOptions& options, const NeighbourhoodFilterMaker& ma
            }});
 }
 
+std::string CannotOccur(const std::string& background, const RasterSource& source) {
+  return "--background " + background + " cannot occur in " + source.Type().Name() + " samples";
+}
+
 }  // namespace
 
 void AddNeighbourhoodOptions(CLI::App& command, NeighbourhoodOptions& options,
@@ -53,14 +57,19 @@ std::optional<double> FindBackground(const NeighbourhoodOptions& options,
   if (text.empty() || text == "none") return std::nullopt;
   const double value = ParseNumber("--background", text);
   if (CanHold(source.Type().code, value)) return value;
-  Warn("--background " + text + " cannot occur in " + source.Type().Name() +
-       " samples and is taken as none");
+  Warn(CannotOccur(text, source) + " and is taken as none");
   return std::nullopt;
 }
 
 double RequireBackground(const NeighbourhoodOptions& options, const RasterSource& source,
                          const NoDataValues& noData) {
-  if (const auto background = FindBackground(options, source)) return *background;
+  const std::string& text = options.background;
+  if (text == "none") throw UsageError("--background none: what is removed must become some value");
+  if (!text.empty()) {
+    const double value = ParseNumber("--background", text);
+    if (!CanHold(source.Type().code, value)) throw UsageError(CannotOccur(text, source));
+    return value;
+  }
   const std::vector<double>& output = noData.output;
   const auto isNaN = [](double value) { return std::isnan(value); };
   if (!output.empty() && std::all_of(output.begin(), output.end(), isNaN)) return output.front();

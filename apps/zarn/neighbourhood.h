@@ -39,7 +39,7 @@ void AddNeighbourhoodOptions(CLI::App& command, NeighbourhoodOptions& options,
 std::optional<double> FindBackground(const NeighbourhoodOptions& options,
                                      const RasterSource& source);
 /// The same for filters that write it: by default the output's no-data value. Throws `UsageError`
-/// where there is neither.
+/// where there is neither, and for a value that cannot be written.
 double RequireBackground(const NeighbourhoodOptions& options, const RasterSource& source,
                          const NoDataValues& noData);
 

@@ -19,7 +19,9 @@ void AddNoiseCommand(CLI::App& app) {
       command, *options,
       {.background =
            "Value that removed samples get. Pixels that have it in all bands enter no window and "
-           "stay as they are; by default the no-data value of OUT"});
+           "stay as they are; by default the no-data value of OUT, that of --dst-nodata where it "
+           "is "
+           "given"});
   command.callback([options] {
     RunBackgroundFilter(*options, [](int size, double background) {
       return std::unique_ptr<processes::filters::IFilter>(

@@ -87,8 +87,9 @@ void Run(const NeighbourhoodOptions& options) {
                         fitted.halo = BlobWindows::Halo(size / 2);
                         fitted.filterBytes = source.Channels().size() * source.Type().Bytes();
                         // No-data pixels are not data here: a blob that they
-                        // surround is one.
+                        // surround is one. The filter compares them exactly.
                         fitted.marksNoData = true;
+                        fitted.exactNoData = true;
                         return fitted;
                       }});
 }
@@ -103,7 +104,7 @@ void AddRemoveBlobsCommand(CLI::App& app) {
       command, *options,
       {.background =
            "Value of background pixels (all bands equal it) and of removed ones; by default the "
-           "no-data value of OUT",
+           "no-data value of OUT, that of --dst-nodata where it is given",
        .mask = "Raster of the same size; pixels where it is 0 are taken for background and stay as "
                "they are"});
   command.callback([options] { Run(*options); });

@@ -6,6 +6,8 @@
 #include <limits>
 #include <span>
 
+#include "host/sys/vectorised.h"
+
 #if ZARN_SIMD
 #include "processes/filters/framework/samplerows_simd.h"
 #endif
@@ -24,6 +26,19 @@ bool UseVectors() {
 #endif
 }
 
+// What the columns `step` to both sides say of a column.
+ZARN_VECTORISED void SpreadBounds(const double* bounds, std::size_t width, std::size_t step,
+                                  double* spread) {
+  const auto apart = static_cast<double>(step);
+  std::copy_n(bounds, width, spread);
+  for (std::size_t x = step; x < width; ++x) {
+    spread[x] = std::min(spread[x], bounds[x - step] + apart);
+  }
+  for (std::size_t x = step; x < width; ++x) {
+    spread[x - step] = std::min(spread[x - step], bounds[x] + apart);
+  }
+}
+
 }  // namespace
 
 DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
@@ -33,24 +48,31 @@ DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std:
       width_(width),
       reach_(index.Blend() + index.DistanceTolerance()),
       groups_(mostGroups),
+      grouped_(mostGroups),
       bounds_(width),
+      spread_(width),
       narrow_(mostGroups),
       narrowWords_(WordsFor(WordsFor(width))),
       near_(mostGroups),
       ordered_(mostGroups),
       vectors_(UseVectors()),
       distances_(WordsFor(width) * kWordColumns),
-      touched_(WordsFor(WordsFor(width))) {}
+      touched_(WordsFor(WordsFor(width))),
+      known_(touched_.size()) {}
 
 void DistanceRows::Prepare(std::int64_t first, std::int64_t last) {
   count_ = 0;
+  std::size_t place = 0;
   index_.ForEachGroup(first, last, [&](const PolygonRowIndex::Group& group) {
     const PolygonEdge& edge = index_.Edges()[group.begin];
     const double dx = edge.x1 - edge.x0;
     const double dy = edge.y1 - edge.y0;
     const double half = std::sqrt(dx * dx + dy * dy) / std::abs(dy) * reach_ * (1 + 1e-9) +
                         index_.DistanceTolerance();
-    groups_[count_++] = {&group, dx / dy, half, {0, width_}};
+    groups_[count_++] = {&group, place, dx / dy, half, {0, width_}};
+    const std::size_t count = group.end - group.begin;
+    if (!vectors_ || count == 1) return;
+    place = grouped_.Put(&edge, count, index_.DistanceTolerance(), place);
   });
   narrowCount_ = 0;
   std::fill(narrowWords_.begin(), narrowWords_.end(), 0);
@@ -80,9 +102,9 @@ void DistanceRows::BoundDistances() {
     double& known = bounds_[static_cast<std::size_t>(column)];
     known = std::min(known, bound);
   }
-  for (std::size_t x = 1; x < width_; ++x) bounds_[x] = std::min(bounds_[x], bounds_[x - 1] + 1);
-  for (std::size_t x = width_ - 1; x > 0; --x) {
-    bounds_[x - 1] = std::min(bounds_[x - 1], bounds_[x] + 1);
+  for (std::size_t step = 1; step < width_ && static_cast<double>(step) < reach_; step *= 2) {
+    SpreadBounds(bounds_.data(), width_, step, spread_.data());
+    bounds_.swap(spread_);
   }
 }
 
@@ -148,8 +170,8 @@ DistanceRows::Columns DistanceRows::NeededColumns(const Prepared& prepared) cons
 // The columns whose centres may lie between the two; what is not a number sets no end.
 DistanceRows::Columns DistanceRows::Held(double low, double high) const {
   const auto columns = static_cast<double>(width_);
-  const double first = std::floor(low - left_) - 1;
-  const double end = std::ceil(high - left_) + 1;
+  const double first = low - left_ - 1;
+  const double end = high - left_ + 2;
   return {first > 0 ? static_cast<std::size_t>(std::min(first, columns)) : 0,
           end < columns ? static_cast<std::size_t>(std::max(end, 0.0)) : width_};
 }
@@ -158,7 +180,7 @@ DistanceRows::Columns DistanceRows::Held(double low, double high) const {
 DistanceRows::Near DistanceRows::Reach(const Prepared& prepared, double y) const {
   const PolygonRowIndex::Group& group = *prepared.group;
   const double above = std::max({group.minY - y, y - group.maxY, 0.0});
-  if (above > reach_) return {&group, above, {}, {}};
+  if (above > reach_) return {&group, prepared.place, above, {}, {}};
   const double aside = above > 0 ? std::sqrt(reach_ * reach_ - above * above) : reach_;
   double low = group.minX - aside;
   double high = group.maxX + aside;
@@ -177,12 +199,20 @@ DistanceRows::Near DistanceRows::Reach(const Prepared& prepared, double y) const
   Columns columns = Held(low, high);
   columns.first = std::max(columns.first, prepared.columns.first);
   columns.end = std::min(columns.end, prepared.columns.end);
-  return {&group, above, columns, Held(ownLow, ownHigh)};
+  return {&group, prepared.place, above, columns, Held(ownLow, ownHigh)};
 }
 
-void DistanceRows::ClearWord(std::size_t word) {
-  std::fill_n(distances_.begin() + static_cast<std::ptrdiff_t>(word * kWordColumns), kWordColumns,
-              std::numeric_limits<double>::infinity());
+// Begins with bounds: nothing beyond the reach matters, and from row to row no distance grows by
+// more than one. (An edge that the row does not list is beyond the reach.)
+void DistanceRows::BeginWord(std::size_t word) {
+  double* const distances = distances_.data() + word * kWordColumns;
+#if ZARN_SIMD
+  if (vectors_ && (known_[word / kWordColumns] >> word % kWordColumns & 1) != 0) {
+    BoundBelow(distances, index_.Blend(), 1 + Slack(), reach_);
+    return;
+  }
+#endif
+  std::fill_n(distances, kWordColumns, reach_ * reach_);
 }
 
 // Makes the words of these columns ready for use.
@@ -192,7 +222,7 @@ void DistanceRows::Touch(Columns columns) {
     const std::uint64_t bit = std::uint64_t{1} << w % kWordColumns;
     if ((bits & bit) != 0) continue;
     bits |= bit;
-    ClearWord(w);
+    BeginWord(w);
   }
 }
 
@@ -201,7 +231,7 @@ void DistanceRows::LowerNarrow([[maybe_unused]] std::int64_t row) {
 #if ZARN_SIMD
   touched_ = narrowWords_;
   ForEachRun(touched_, [&](std::size_t first, std::size_t end) {
-    for (std::size_t w = first; w < end; ++w) ClearWord(w);
+    for (std::size_t w = first; w < end; ++w) BeginWord(w);
   });
   LowerNarrowDistances(narrow_.data(), narrowCount_, {distances_.data(), left_, row});
 #endif
@@ -242,11 +272,14 @@ void DistanceRows::Lower(const Near& near, Columns columns, std::int64_t row) {
 #if ZARN_SIMD
   if (vectors_) {
     const double slack = index_.DistanceTolerance();
+    const bool isShared = row >= group.firstShared && row <= group.lastShared;
     LowerDistances({.edges = edges + group.begin,
                     .count = group.end - group.begin,
                     .minX = group.minX - slack,
                     .maxX = group.maxX + slack,
-                    .above = std::max(near.above - slack, 0.0)},
+                    .above = std::max(near.above - slack, 0.0),
+                    .grouped = isShared ? &grouped_ : nullptr,
+                    .place = near.place},
                    columns.first, columns.end, {distances_.data(), left_, row});
     return;
   }
@@ -263,6 +296,9 @@ void DistanceRows::Lower(const Near& near, Columns columns, std::int64_t row) {
 
 void DistanceRows::Compute(std::int64_t row, const PixelBits& inside, PixelBits& band) {
   std::fill(band.begin(), band.end(), 0);
+  known_.swap(touched_);
+  if (row != above_ + 1) std::fill(known_.begin(), known_.end(), 0);
+  above_ = row;
   std::fill(touched_.begin(), touched_.end(), 0);
   LowerNarrow(row);
   CollectNear(row, static_cast<double>(row) + 0.5);

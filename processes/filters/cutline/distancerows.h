@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "processes/filters/cutline/distancerows_simd.h"
+#include "processes/filters/cutline/groupededges.h"
 #include "processes/filters/cutline/pixelbits.h"
 #include "processes/filters/cutline/polygonrowindex.h"
 
@@ -39,6 +40,7 @@ class DistanceRows {
   };
   struct Prepared {
     const PolygonRowIndex::Group* group;
+    std::size_t place;  // of its edges in `grouped_`
     // Of a group of one edge: columns per row, and how far to both sides of it the columns within
     // reach of its line extend in a row. Infinite or no number where it is horizontal.
     double slope;
@@ -54,6 +56,7 @@ class DistanceRows {
   // A group that the row at hand is within reach of.
   struct Near {
     const PolygonRowIndex::Group* group;
+    std::size_t place;
     double above;  // how far the row is from its box
     Columns columns;
     Columns own;  // where the row meets the group itself
@@ -70,7 +73,7 @@ class DistanceRows {
   Columns NeededColumns(const Prepared& prepared) const;
   Near Reach(const Prepared& prepared, double y) const;
   Columns Held(double low, double high) const;
-  void ClearWord(std::size_t word);
+  void BeginWord(std::size_t word);
   void Touch(Columns columns);
   void LowerNarrow(std::int64_t row);
   void CollectNear(std::int64_t row, double y);
@@ -84,7 +87,9 @@ class DistanceRows {
   Rows rows_{};
   std::size_t count_ = 0;
   std::vector<Prepared> groups_;
+  GroupedEdges grouped_;        ///< those of groups of several
   std::vector<double> bounds_;  ///< no pixel of the rows at hand is farther from the polygon
+  std::vector<double> spread_;  ///< scratch beside them
   std::size_t narrowCount_ = 0;
   std::vector<NarrowEdge> narrow_;  ///< taken out of `groups_`
   PixelBits narrowWords_;           ///< the words that they have to do with
@@ -94,6 +99,8 @@ class DistanceRows {
   bool vectors_;
   std::vector<double> distances_;  ///< squared ones, then weights; whole words
   PixelBits touched_;              ///< the words of `distances_` that are in use
+  PixelBits known_;                ///< those that hold the weights of the row above
+  std::int64_t above_ = 0;         ///< that row, if any is known
 };
 
 }  // namespace zarn::processes::filters

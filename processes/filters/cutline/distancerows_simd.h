@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "processes/filters/cutline/groupededges.h"
 #include "processes/filters/cutline/pixelbits.h"
 #include "processes/filters/cutline/polygonedge.h"
 
@@ -17,14 +18,16 @@ struct DistanceRow {
   std::int64_t row;
 };
 
-/// Edges of one polygon that lie together. No distance to any of them that is computed in the row
-/// is below that to the box from `minX` to `maxX`, `above` the row.
+/// Edges of one polygon that lie together, `kMostGrouped` at the most. No distance to any of them
+/// that is computed in the row is below that to the box from `minX` to `maxX`, `above` the row.
 struct NearEdges {
   const PolygonEdge* edges;
   std::size_t count;
   double minX;
   double maxX;
   double above;
+  const GroupedEdges* grouped = nullptr;  ///< given where the row is in the band of all edges
+  std::size_t place = 0;                  ///< of the first one there
 };
 
 /// Lowers the squared distances of the columns `first` .. `end` - 1, and maybe of others in the
@@ -50,5 +53,9 @@ void LowerNarrowDistances(const NarrowEdge* edges, std::size_t count, const Dist
 /// Turns the squared distances of one word into weights, negative where the pixel is not inside.
 /// Returns the bits of those between -1 and 1.
 std::uint64_t WeighDistances(double* squared, std::uint64_t inside, double blend);
+
+/// Turns the weights of one word into the squares of what no pixel in the row below is farther away
+/// than, `step` more than here, or `most` where that is less.
+void BoundBelow(double* weights, double blend, double step, double most);
 
 }  // namespace zarn::processes::filters

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cmath>
+#include <cstddef>
 #include <cstdint>
 
 namespace zarn::processes::filters {
@@ -21,6 +22,9 @@ struct PolygonEdge {
   std::int64_t firstBand = 0;  ///< distances are measured to the edge from this row on
   std::int64_t lastBand = 0;   ///< up to here, inclusively
 };
+
+/// Edges that lie together are looked at together, so many at the most.
+inline constexpr std::size_t kMostGrouped = 16;
 
 /// Whether an edge that spans the row of (x, y) is crossed by the ray from there towards +x.
 inline bool CrossesRay(const PolygonEdge& edge, double x, double y) {

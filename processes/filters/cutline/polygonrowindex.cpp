@@ -79,7 +79,6 @@ void PolygonRowIndex::AddEdges(const PolygonParam& polygon) {
 
 void PolygonRowIndex::FormGroups() {
   // Groups that are small beside the band tell well how far their edges are.
-  constexpr std::uint32_t kMostEdges = 16;
   const double mostExtent = std::max(4.0, blend_ / 8.0);
   for (std::uint32_t i = 0; i < edges_.size(); ++i) {
     const PolygonEdge& e = edges_[i];
@@ -90,7 +89,9 @@ void PolygonRowIndex::FormGroups() {
                     .maxX = std::max(e.x0, e.x1),
                     .maxY = std::max(e.y0, e.y1),
                     .firstRow = e.firstBand,
-                    .lastRow = e.lastBand};
+                    .lastRow = e.lastBand,
+                    .firstShared = e.firstBand,
+                    .lastShared = e.lastBand};
     if (!groups_.empty()) {
       Group& last = groups_.back();
       const Group joined{.begin = last.begin,
@@ -100,8 +101,10 @@ void PolygonRowIndex::FormGroups() {
                          .maxX = std::max(last.maxX, own.maxX),
                          .maxY = std::max(last.maxY, own.maxY),
                          .firstRow = std::min(last.firstRow, own.firstRow),
-                         .lastRow = std::max(last.lastRow, own.lastRow)};
-      if (joined.end - joined.begin <= kMostEdges && joined.maxX - joined.minX <= mostExtent &&
+                         .lastRow = std::max(last.lastRow, own.lastRow),
+                         .firstShared = std::max(last.firstShared, own.firstShared),
+                         .lastShared = std::min(last.lastShared, own.lastShared)};
+      if (joined.end - joined.begin <= kMostGrouped && joined.maxX - joined.minX <= mostExtent &&
           joined.maxY - joined.minY <= mostExtent) {
         last = joined;
         continue;

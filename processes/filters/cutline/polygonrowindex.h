@@ -18,7 +18,8 @@ namespace zarn::processes::filters {
 /// is not finite has no edges, so it admits no pixel. Read only once built.
 class PolygonRowIndex {
  public:
-  /// Edges `begin` .. `end` - 1 of `Edges()` and what all of them keep within.
+  /// Edges `begin` .. `end` - 1 of `Edges()`, `kMostGrouped` of them at the most, and what all of
+  /// them keep within.
   struct Group {
     std::uint32_t begin;
     std::uint32_t end;
@@ -26,8 +27,10 @@ class PolygonRowIndex {
     double minY;
     double maxX;
     double maxY;
-    std::int64_t firstRow;  ///< the first row that any edge has to do with
-    std::int64_t lastRow;   ///< the last one
+    std::int64_t firstRow;     ///< the first row that any edge has to do with
+    std::int64_t lastRow;      ///< the last one
+    std::int64_t firstShared;  ///< the first row that all edges have to do with
+    std::int64_t lastShared;   ///< the last one
   };
 
   /// Copies the vertices; `blend` is the half width of the band in pixels, 0 for none.

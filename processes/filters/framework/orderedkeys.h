@@ -39,6 +39,13 @@ constexpr OrderedKey<T> ToOrderedKey(T sample) {
   }
 }
 
+/// The greatest bits of a sample that is neither negative nor NaN: up to there samples sort as
+/// their bits do.
+template <typename T>
+inline constexpr OrderedKey<T> kMostSortedBits =
+    std::bit_cast<OrderedKey<T>>(std::is_floating_point_v<T> ? std::numeric_limits<T>::infinity()
+                                                             : std::numeric_limits<T>::max());
+
 /// The order of keys, for the algorithms of the standard library.
 struct SortsBefore {
   template <typename T>

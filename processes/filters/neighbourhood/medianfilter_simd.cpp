@@ -55,6 +55,25 @@ HWY_ATTR void FlagSamples(const T* row, std::size_t pixels, std::size_t channels
   }
 }
 
+/// Whether none of the bits that count are those of a negative sample or a NaN. `excluded` is null
+/// where all count.
+template <typename T>
+HWY_ATTR bool SortAsBits(const OrderedKey<T>* bits, const OrderedKey<T>* excluded,
+                         std::size_t count) {
+  const hn::ScalableTag<OrderedKey<T>> d;
+  const std::size_t lanes = hn::Lanes(d);
+  auto most = hn::Zero(d);
+  const auto load = [&](std::size_t i) HWY_ATTR {
+    const auto v = hn::LoadU(d, bits + i);
+    return excluded == nullptr ? v : hn::AndNot(hn::LoadU(d, excluded + i), v);
+  };
+  std::size_t i = 0;
+  for (; i + lanes <= count; i += lanes) most = hn::Max(most, load(i));
+  most = hn::Max(most, hn::IfThenElseZero(hn::FirstN(d, count - i), load(i)));
+  const auto limit = hn::Set(d, kMostSortedBits<T>);
+  return hn::AllTrue(d, hn::Eq(hn::Max(most, limit), limit));
+}
+
 /// One strip of columns in one band of rows. Each row is looked at once as it enters.
 template <typename T>
 class MedianStrip {
@@ -67,7 +86,10 @@ class MedianStrip {
         plan_(plan),
         scratch_(scratch),
         strip_(job, scratch.strip, firstColumn, plan.strip) {
-    for (KeyRow<Key>& row : scratch_.ring) row.dirty = false;
+    for (MedianRow<T>& row : scratch_.ring) {
+      row.dirty = false;
+      row.sortsBits = true;
+    }
   }
 
   HWY_ATTR void Run(std::ptrdiff_t begin, std::ptrdiff_t end) {
@@ -80,73 +102,66 @@ class MedianStrip {
 
  private:
   // The rows of the window, from the top.
-  const KeyRow<Key>& Window(std::size_t index) const {
+  MedianRow<T>& Window(std::size_t index) const {
     const std::size_t slot = oldest_ + index;
     return scratch_.ring[slot < plan_.taps ? slot : slot - plan_.taps];
   }
 
   // Moves the window down by one row.
   HWY_ATTR void Enter(std::ptrdiff_t y) {
-    KeyRow<Key>& row = scratch_.ring[oldest_];
+    MedianRow<T>& row = scratch_.ring[oldest_];
     oldest_ = oldest_ + 1 == plan_.taps ? 0 : oldest_ + 1;
-    T* copy = scratch_.copy;
-    if constexpr (kIsOwnKey<T>) copy = row.ownKeys;
-    const T* const input = strip_.WindowRow(y, copy);
+    dirtyRows_ -= row.dirty ? 1 : 0;
+    unsortedRows_ -= row.sortsBits ? 0 : 1;
+    const T* const samples = strip_.WindowRow(y, row.ownSamples);
     const ExclusionTests<T> tests = strip_.Tests(y);
     strip_.PrefetchRow(y + 1);
-    dirtyRows_ -= row.dirty ? 1 : 0;
-    row.dirty = tests.Any() && AnyExcluded(input, plan_.Pixels(), plan_.channels, tests);
-    dirtyRows_ += row.dirty ? 1 : 0;
+    row.dirty = tests.Any() && AnyExcluded(samples, plan_.Pixels(), plan_.channels, tests);
     row.excluded = row.dirty ? row.ownExcluded : scratch_.clean;
-    if (row.dirty) FlagSamples(input, plan_.Pixels(), plan_.channels, tests, row.ownExcluded);
-    if constexpr (kIsOwnKey<T>) {
-      row.keys = input;
-    } else {
-      MakeKeys(input, row.ownKeys);
-      row.keys = row.ownKeys;
-    }
+    if (row.dirty) FlagSamples(samples, plan_.Pixels(), plan_.channels, tests, row.ownExcluded);
+    row.bits = reinterpret_cast<const Key*>(samples);
+    row.hasKeys = false;
+    row.sortsBits = kIsOwnKey<T> ||
+                    SortAsBits<T>(row.bits, row.dirty ? row.excluded : nullptr, plan_.Samples());
+    dirtyRows_ += row.dirty ? 1 : 0;
+    unsortedRows_ += row.sortsBits ? 0 : 1;
   }
 
-  HWY_ATTR void MakeKeys(const T* samples, Key* keys) const {
+  // The ordered keys of a row.
+  HWY_ATTR const Key* Keys(MedianRow<T>& row) const {
+    if (row.hasKeys) return row.ownKeys;
+    row.hasKeys = true;
     const hn::ScalableTag<Key> d;
-    const Key* const bits = reinterpret_cast<const Key*>(samples);
     for (std::size_t i = 0; i < plan_.Samples(); i += hn::Lanes(d)) {
-      hn::StoreU(KeysOfBits<T>(d, hn::LoadU(d, bits + i)), d, keys + i);
+      hn::StoreU(KeysOfBits<T>(d, hn::LoadU(d, row.bits + i)), d, row.ownKeys + i);
     }
-  }
-
-  // The samples of the medians, perhaps in their place.
-  HWY_ATTR void StoreSamples(T* samples) {
-    std::size_t i = 0;
-    Key* const keys = scratch_.medians;
-    if constexpr (!kIsOwnKey<T>) {
-      const hn::ScalableTag<Key> d;
-      Key* const bits = reinterpret_cast<Key*>(samples);
-      for (; i + hn::Lanes(d) <= plan_.Outputs(); i += hn::Lanes(d)) {
-        hn::StoreU(BitsOfKeys<T>(d, hn::LoadU(d, keys + i)), d, bits + i);
-      }
-      hn::StoreU(BitsOfKeys<T>(d, hn::LoadU(d, keys + i)), d, keys + i);
-    }
-    std::memmove(samples + i, keys + i, (plan_.Outputs() - i) * sizeof(T));
+    return row.ownKeys;
   }
 
   HWY_ATTR void FilterRow(std::ptrdiff_t y) {
+    const MedianRow<T>& centre = Window(plan_.taps / 2);
     const Key* rows[kMostMedianTaps];
     const Key* excluded[kMostMedianTaps];
     for (std::size_t r = 0; r < plan_.taps; ++r) {
-      rows[r] = Window(r).keys;
+      rows[r] = unsortedRows_ == 0 ? Window(r).bits : Keys(Window(r));
       excluded[r] = Window(r).excluded;
     }
+    T* const output = strip_.Output(y);
+    const bool inPlace = unsortedRows_ == 0 && !centre.dirty;
     FindMedians(KeyWindows<Key>{rows, dirtyRows_ == 0 ? nullptr : excluded, plan_.taps,
-                                plan_.channels, plan_.Outputs(), scratch_.columns, scratch_.pitch,
-                                scratch_.medians});
-    T* const results = reinterpret_cast<T*>(scratch_.medians);
-    const KeyRow<Key>& centre = Window(plan_.taps / 2);
+                                plan_.channels, plan_.Outputs(), scratch_.windows,
+                                inPlace ? reinterpret_cast<Key*>(output) : scratch_.medians});
+    if (inPlace) return;
+    Key* const medians = scratch_.medians;
+    const hn::ScalableTag<Key> d;
+    for (std::size_t i = 0; unsortedRows_ != 0 && i < plan_.Outputs(); i += hn::Lanes(d)) {
+      hn::StoreU(BitsOfKeys<T>(d, hn::LoadU(d, medians + i)), d, medians + i);
+    }
+    T* const results = reinterpret_cast<T*>(medians);
     if (!centre.dirty) {
-      StoreSamples(strip_.Output(y));
+      std::memcpy(output, results, plan_.Outputs() * sizeof(T));
       return;
     }
-    StoreSamples(results);
     const Key* const flags = centre.excluded + plan_.taps / 2 * plan_.channels;
     strip_.Merge(y, results, [&](std::size_t x) { return flags[x * plan_.channels] != 0; });
   }
@@ -155,8 +170,10 @@ class MedianStrip {
   const MedianPlan& plan_;
   MedianScratch<T>& scratch_;
   const WindowStrip<T> strip_;
-  std::size_t oldest_ = 0;        // slot of the window's top row
-  std::ptrdiff_t dirtyRows_ = 0;  // of the window
+  std::size_t oldest_ = 0;  // slot of the window's top row
+  // Of the window:
+  std::ptrdiff_t dirtyRows_ = 0;
+  std::ptrdiff_t unsortedRows_ = 0;
 };
 
 template <typename T>

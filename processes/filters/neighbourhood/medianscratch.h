@@ -7,6 +7,7 @@
 
 #include "processes/filters/framework/orderedkeys.h"
 #include "processes/filters/neighbourhood/medianrows.h"
+#include "processes/filters/neighbourhood/windowmedians_simd.h"
 #include "processes/filters/neighbourhood/windowscratch.h"
 
 namespace zarn::processes::filters {
@@ -37,14 +38,19 @@ struct MedianPlan {
   }
 };
 
-/// One input row of a window as ordered keys.
-template <typename Key>
-struct KeyRow {
-  const Key* keys;      ///< the input itself where its samples are their own keys, else a copy
+/// One input row of a window.
+template <typename T>
+struct MedianRow {
+  using Key = OrderedKey<T>;
+
+  const Key* bits;      ///< of the samples: the input itself where that is possible, else a copy
   const Key* excluded;  ///< all bits set where the pixel of the sample is excluded, else 0
-  Key* ownKeys;         ///< where a copy goes
+  T* ownSamples;        ///< where a copy goes
+  Key* ownKeys;         ///< the ordered keys, once they are asked for
   Key* ownExcluded;
-  bool dirty;  ///< whether any pixel is excluded
+  bool hasKeys;
+  bool dirty;      ///< whether any pixel is excluded
+  bool sortsBits;  ///< whether the samples that count sort as their bits do
 };
 
 /// Scratch of one band, cut from a single allocation.
@@ -52,25 +58,22 @@ template <typename T>
 struct MedianScratch {
   using Key = OrderedKey<T>;
 
-  KeyRow<Key> ring[kMostMedianTaps];
-  Key* clean;  ///< a row without exclusions
-  Key* columns;
-  std::size_t pitch;
+  MedianRow<T> ring[kMostMedianTaps];
+  Key* clean;    ///< a row without exclusions
+  Key* windows;  ///< of `FindMedians`
   Key* medians;
-  T* copy;  ///< an input row that must not be read past its end
   StripScratch<T> strip;
 
   static MedianScratch Cut(const MedianPlan& plan, ScratchCutter& cutter) {
     MedianScratch s{};
     for (std::size_t slot = 0; slot < plan.taps; ++slot) {
+      s.ring[slot].ownSamples = cutter.Row<T>(plan.Samples());
       s.ring[slot].ownKeys = cutter.Row<Key>(plan.Samples());
       s.ring[slot].ownExcluded = cutter.Row<Key>(plan.Samples());
     }
     s.clean = cutter.Row<Key>(plan.Samples());
-    s.pitch = plan.Samples() + kRowPadding;
-    s.columns = cutter.Row<Key>((plan.taps + 1) * s.pitch);
+    s.windows = cutter.Row<Key>(MedianScratchKeys<Key>(plan.taps, plan.channels));
     s.medians = cutter.Row<Key>(plan.Outputs());
-    s.copy = cutter.Row<T>(plan.Samples());
     s.strip = StripScratch<T>::Cut(cutter, plan.Outputs(), plan.Pixels());
     return s;
   }

@@ -50,9 +50,12 @@ HWY_INLINE hn::Vec<D> LoadSquares(D d, const T* from) {
   }
 }
 
-/// What adds samples up where `Acc` adds up their squares.
+/// What adds samples up where `Acc` adds up their squares (for 16 bits, see `SlideSmall`).
 template <typename Acc>
 using SumFor = std::conditional_t<std::is_same_v<Acc, std::int32_t>, std::uint16_t, Acc>;
+template <typename Acc>
+using NoiseCountFor =
+    std::conditional_t<std::is_same_v<Acc, std::int16_t>, std::uint16_t, CountFor<Acc>>;
 
 /// sums[i] += added[i] - removed[i], or the same with squares; `removed` may be null.
 template <bool kSquares, typename Acc, typename T>
@@ -109,7 +112,7 @@ struct Moments {
   const T* centre;
   const SumFor<Acc>* sums;
   const Acc* squares;
-  const CountFor<Acc>* excluded;  ///< null: all of `window` samples count
+  const NoiseCountFor<Acc>* excluded;  ///< null: all of `window` samples count
   std::size_t window;
   std::size_t count;
 };
@@ -200,13 +203,229 @@ HWY_ATTR void JudgeSquares(const Moments<T, std::int32_t>& m, std::uint8_t* flag
   }
 }
 
+// Bytes in windows of up to five by five. What is judged does not change when all samples are less
+// by the same amount, so they are taken as v = byte - 128, and then all that is summed up by
+// columns fits 16 bits: v itself, and in place of its square the triangular number v * (v - 1) / 2,
+// which is from 0 to 8256, less the middle of that range. An excluded sample is one of 128 and adds
+// nothing.
+
+constexpr int kSmallMiddle = 128;
+constexpr int kTriangleMiddle = 4128;
+
+/// Moves the sums of columns down by one row; `removed` may be null.
+HWY_ATTR inline void SlideSmall(const std::uint8_t* HWY_RESTRICT added,
+                                const std::uint8_t* HWY_RESTRICT removed, std::size_t samples,
+                                std::int16_t* HWY_RESTRICT sums,
+                                std::int16_t* HWY_RESTRICT triangles) {
+  const hn::ScalableTag<std::int16_t> d;
+  const auto middle = hn::Set(d, std::int16_t{kSmallMiddle});
+  const auto twoMiddlesAndOne = hn::Set(d, std::int16_t{2 * kSmallMiddle + 1});
+  for (std::size_t i = 0; i < samples; i += hn::Lanes(d)) {
+    const auto in = LoadSamples(d, added + i);
+    const auto out = removed == nullptr ? middle : LoadSamples(d, removed + i);
+    const auto change = hn::Sub(in, out);
+    // Twice the difference of two triangular numbers.
+    const auto twice = hn::Mul(change, hn::Sub(hn::Add(in, out), twoMiddlesAndOne));
+    hn::StoreU(hn::Add(hn::LoadU(d, sums + i), change), d, sums + i);
+    hn::StoreU(hn::Add(hn::LoadU(d, triangles + i), hn::ShiftRight<1>(twice)), d, triangles + i);
+  }
+}
+
+/// The windows of a row of samples.
+struct SmallMoments {
+  const std::uint8_t* centre;
+  const std::int16_t* sums;       ///< of the windows
+  const std::int16_t* triangles;  ///< of the columns, from the window's left on
+  const std::uint16_t* excluded;  ///< null: all samples count
+  std::size_t taps;
+  std::size_t step;
+  std::size_t count;
+};
+
+HWY_NOINLINE void JudgeSmallOneByOne(const SmallMoments& m, std::size_t first, std::size_t count,
+                                     std::uint8_t* flags) {
+  const auto window = static_cast<int>(m.taps * m.taps);
+  for (std::size_t i = first; i < std::min(first + count, m.count); ++i) {
+    const int n = window - (m.excluded == nullptr ? 0 : m.excluded[i]);
+    int triangles = window * kTriangleMiddle;
+    for (std::size_t t = 0; t < m.taps; ++t) triangles += m.triangles[i + t * m.step];
+    const int sum = m.sums[i] + kSmallMiddle * n;
+    const int squares =
+        2 * triangles + m.sums[i] + 2 * kSmallMiddle * m.sums[i] + kSmallMiddle * kSmallMiddle * n;
+    flags[i] = StandsOut(m.centre[i], n, sum, squares) ? 1 : 0;
+  }
+}
+
+/// The sums of the products of the two halves of each pair.
+template <class D32, class V16>
+HWY_INLINE hn::Vec<D32> PairProducts(D32 d, V16 a, V16 b) {
+#if HWY_ARCH_X86
+  auto unused = hn::Zero(d);
+  return hn::ReorderWidenMulAccumulate(d, a, b, hn::Zero(d), unused);
+#else
+  const auto wideA = hn::BitCast(d, a);
+  const auto wideB = hn::BitCast(d, b);
+  const auto low = [&](auto v) HWY_ATTR { return hn::ShiftRight<16>(hn::ShiftLeft<16>(v)); };
+  return hn::Add(hn::Mul(low(wideA), low(wideB)),
+                 hn::Mul(hn::ShiftRight<16>(wideA), hn::ShiftRight<16>(wideB)));
+#endif
+}
+
+/// Every other window of a vector, from the first or the second one on, as pairs of 16 bits.
+template <std::size_t kPhase>
+struct EveryOther {
+  hn::ScalableTag<std::int16_t> d;
+  hn::RepartitionToWide<decltype(d)> d32;
+  hn::RepartitionToWide<hn::RebindToUnsigned<decltype(d)>> du32;
+  using V = hn::Vec<hn::ScalableTag<std::int16_t>>;
+
+  /// From vectors of all windows.
+  HWY_INLINE V Pairs(V first, V second) const {
+    if constexpr (kPhase == 0) {
+      second = hn::BitCast(d, hn::ShiftLeft<16>(hn::BitCast(du32, second)));
+    } else {
+      first = hn::BitCast(d, hn::ShiftRight<16>(hn::BitCast(du32, first)));
+    }
+    return hn::OddEven(second, first);
+  }
+  /// From rows in memory. (The second may be read one element before its place.)
+  HWY_INLINE V Pairs(const std::int16_t* first, const std::int16_t* second) const {
+    return hn::OddEven(hn::LoadU(d, second + kPhase - 1), hn::LoadU(d, first + kPhase));
+  }
+  HWY_INLINE V Pairs(V first, const std::int16_t* second) const {
+    if constexpr (kPhase == 1) {
+      first = hn::BitCast(d, hn::ShiftRight<16>(hn::BitCast(du32, first)));
+    }
+    return hn::OddEven(hn::LoadU(d, second + kPhase - 1), first);
+  }
+};
+
+/// The rule 4 * (n - 1) * (n * v - S)^2 > 9 * n * (n * Q - S^2) where all of n = kTaps^2 samples
+/// count, divided by what both sides share, with Q = 2 * triangles + S. All of it fits 32 bits.
+template <std::size_t kTaps>
+struct SmallRule {
+  static constexpr int kWindow = kTaps * kTaps;
+  static constexpr int kShared = kTaps == 5 ? 3 : 1;
+  static constexpr int kActual = 4 * (kWindow - 1) / kShared;
+  static constexpr int kAllowed = 9 * kWindow / kShared;
+  static_assert(kActual == 32, "eight times the product of what fits 16 bits");
+  static constexpr int kTriangles = 2 * kAllowed * kWindow;
+
+  /// By how much the windows exceed the bound; `distance` is n * v - S, at least 0.
+  template <std::size_t kPhase, class V>
+  static HWY_INLINE auto Excess(const EveryOther<kPhase>& every, V distance, V sum,
+                                const std::int16_t* triangles, std::size_t step) {
+    const auto& d = every.d;
+    const auto& d32 = every.d32;
+    const auto times = [&](V v, int factor) HWY_ATTR {
+      return hn::Mul(v, hn::Set(d, static_cast<std::int16_t>(factor)));
+    };
+    const V weight = hn::Set(d, static_cast<std::int16_t>(-kTriangles));
+    const auto squares = PairProducts(d32, every.Pairs(distance, sum),
+                                      every.Pairs(times(distance, 4), times(sum, kAllowed / 8)));
+    const V factor = hn::Sub(times(sum, kAllowed % 8),
+                             hn::Set(d, static_cast<std::int16_t>(kAllowed * kWindow)));
+    const std::size_t last = (kTaps - 1) * step;
+    auto excess =
+        PairProducts(d32, every.Pairs(sum, triangles + last), every.Pairs(factor, weight));
+    for (std::size_t t = 0; t + 1 < kTaps; t += 2) {
+      const std::int16_t* const at = triangles + t * step;
+      excess = hn::Add(excess, PairProducts(d32, every.Pairs(at, at + step), weight));
+    }
+    excess = hn::Add(excess, hn::ShiftLeft<3>(squares));
+    return hn::Sub(excess, hn::Set(d32, kTriangles * kWindow * kTriangleMiddle));
+  }
+};
+
+/// Both sides of the rule for any number of samples, as unsigned numbers of 32 bits.
+template <std::size_t kPhase, class V>
+HWY_INLINE void SmallSides(const EveryOther<kPhase>& every, V n, V distance, V sum,
+                           const std::int16_t* triangles, std::size_t taps, std::size_t step,
+                           hn::VFromD<decltype(every.du32)>& actual,
+                           hn::VFromD<decltype(every.du32)>& allowed) {
+  const auto& d = every.d;
+  const auto& d32 = every.d32;
+  const auto& du32 = every.du32;
+  const V zero = hn::Zero(d);
+  const auto wide = [&](V v) HWY_ATTR {
+    return hn::BitCast(du32, PairProducts(d32, every.Pairs(v, zero), hn::Set(d, 1)));
+  };
+  const auto square = [&](V v) HWY_ATTR {
+    return hn::BitCast(du32, PairProducts(d32, every.Pairs(v, zero), every.Pairs(v, zero)));
+  };
+  const auto window = static_cast<int>(taps * taps);
+  auto all = hn::Set(d32, window * kTriangleMiddle);
+  for (std::size_t t = 0; t + 1 < taps; t += 2) {
+    const std::int16_t* const at = triangles + t * step;
+    all = hn::Add(all, PairProducts(d32, every.Pairs(at, at + step), hn::Set(d, 1)));
+  }
+  all = hn::Add(all,
+                PairProducts(d32, every.Pairs(zero, triangles + (taps - 1) * step), hn::Set(d, 1)));
+  const auto count = wide(n);
+  const auto squares = hn::Add(hn::ShiftLeft<1>(hn::BitCast(du32, all)), wide(sum));
+  const auto spread = hn::Sub(hn::Mul(count, squares), square(sum));
+  allowed = hn::Mul(hn::Mul(count, hn::Set(du32, 9)), spread);
+  actual = hn::Mul(hn::Sub(hn::ShiftLeft<2>(count), hn::Set(du32, 4)), square(distance));
+}
+
+/// Flags the samples that the definition calls noise. All numbers are exact, and the definition
+/// errs by far less than any two different sides are apart: only where they are equal it is asked
+/// itself.
+template <std::size_t kTaps>
+HWY_ATTR void JudgeSmall(const SmallMoments& m, std::uint8_t* flags) {
+  const hn::ScalableTag<std::int16_t> d;
+  const EveryOther<0> even;
+  const EveryOther<1> odd;
+  const hn::Rebind<std::int8_t, decltype(d)> d8;
+  const auto middle = hn::Set(d, std::int16_t{kSmallMiddle});
+  for (std::size_t i = 0; i < m.count; i += hn::Lanes(d)) {
+    auto n = hn::Set(d, static_cast<std::int16_t>(kTaps * kTaps));
+    if (m.excluded != nullptr) {
+      n = hn::Sub(n, hn::LoadU(d, reinterpret_cast<const std::int16_t*>(m.excluded) + i));
+    }
+    const auto sum = hn::LoadU(d, m.sums + i);
+    const auto v = hn::Sub(LoadSamples(d, m.centre + i), middle);
+    const auto distance = hn::Max(hn::Sub(hn::Mul(n, v), sum), hn::Zero(d));
+    const std::int16_t* const triangles = m.triangles + i;
+    hn::Vec<decltype(d)> above;
+    hn::Vec<decltype(d)> equal;
+    const auto both = [&](auto evenMask, auto oddMask) HWY_ATTR {
+      return hn::OddEven(hn::BitCast(d, hn::VecFromMask(oddMask)),
+                         hn::BitCast(d, hn::VecFromMask(evenMask)));
+    };
+    if (m.excluded == nullptr) {
+      const auto first = SmallRule<kTaps>::Excess(even, distance, sum, triangles, m.step);
+      const auto second = SmallRule<kTaps>::Excess(odd, distance, sum, triangles, m.step);
+      const auto zero = hn::Zero(even.d32);
+      above = both(hn::Gt(first, zero), hn::Gt(second, zero));
+      equal = both(hn::Eq(first, zero), hn::Eq(second, zero));
+    } else {
+      hn::VFromD<decltype(even.du32)> actual[2];
+      hn::VFromD<decltype(even.du32)> allowed[2];
+      SmallSides(even, n, distance, sum, triangles, kTaps, m.step, actual[0], allowed[0]);
+      SmallSides(odd, n, distance, sum, triangles, kTaps, m.step, actual[1], allowed[1]);
+      above = both(hn::Gt(actual[0], allowed[0]), hn::Gt(actual[1], allowed[1]));
+      equal = both(hn::Eq(actual[0], allowed[0]), hn::Eq(actual[1], allowed[1]));
+    }
+    hn::StoreU(hn::DemoteTo(d8, above), d8, reinterpret_cast<std::int8_t*>(flags) + i);
+    const auto doubtful = hn::And(hn::Ne(equal, hn::Zero(d)), hn::Gt(distance, hn::Zero(d)));
+    if (HWY_UNLIKELY(!hn::AllFalse(d, doubtful))) JudgeSmallOneByOne(m, i, hn::Lanes(d), flags);
+  }
+}
+
+HWY_ATTR inline void JudgeSmall(const SmallMoments& m, std::uint8_t* flags) {
+  m.taps == 3 ? JudgeSmall<3>(m, flags) : JudgeSmall<5>(m, flags);
+}
+
 /// One strip of columns in one band of rows, as the average filter has it: each row is looked at
 /// once as it enters, and sums of columns gain the entering row and lose the leaving one.
 template <typename T, typename Acc>
 class NoiseStrip {
  public:
-  using Count = CountFor<Acc>;
+  using Count = NoiseCountFor<Acc>;
   using Sum = SumFor<Acc>;
+  static constexpr bool kSmall = std::is_same_v<Acc, std::int16_t>;
+  static constexpr T kNeutral = static_cast<T>(kSmall ? kSmallMiddle : 0);
 
   NoiseStrip(const NoiseJob<T>& job, const NoisePlan& plan, const NoiseScratch<T>& scratch,
              std::ptrdiff_t firstColumn)
@@ -253,7 +472,7 @@ class NoiseStrip {
     strip_.PrefetchRow(y + 1);
     row.dirty = tests.Any() && AnyExcluded(input, plan_.Pixels(), plan_.channels, tests);
     if (row.dirty) {
-      CopyUnexcluded(input, plan_.Pixels(), plan_.channels, tests, T{0}, row.ownSamples,
+      CopyUnexcluded(input, plan_.Pixels(), plan_.channels, tests, kNeutral, row.ownSamples,
                      row.ownFlags);
     }
     row.samples = row.dirty ? row.ownSamples : input;
@@ -278,14 +497,19 @@ class NoiseStrip {
     Acc* const squares = Row(scratch_.squareColumns);
     const std::size_t samples = plan_.Samples();
     const auto slide = [&](const T* added, const T* removed) HWY_ATTR {
-      SlideSums<false>(added, removed, samples, sums);
-      SlideSums<true>(added, removed, samples, squares);
+      if constexpr (kSmall) {
+        SlideSmall(added, removed, samples, sums, squares);
+      } else {
+        SlideSums<false>(added, removed, samples, sums);
+        SlideSums<true>(added, removed, samples, squares);
+      }
     };
     if (columnsReady_ && Exact(true)) {
       slide(Entering().samples, Leaving().samples);
     } else if ((columnsReady_ = Exact(false))) {
       std::fill_n(sums, samples + kRowPadding, Sum{0});
-      std::fill_n(squares, samples + kRowPadding, Acc{0});
+      const int begin = kSmall ? -kTriangleMiddle * static_cast<int>(plan_.taps) : 0;
+      std::fill_n(squares, samples + kRowPadding, static_cast<Acc>(begin));
       for (std::size_t r = 0; r < plan_.taps; ++r) slide(Window(r).samples, nullptr);
     }
     auto* const excluded = Row<Count>(scratch_.excludedColumns);
@@ -306,7 +530,11 @@ class NoiseStrip {
     const Moments<T, Acc> moments{centre,          Row<Sum>(scratch_.sums), Row(scratch_.squares),
                                   CountExcluded(), plan_.Window(),          plan_.Outputs()};
     SumWindows();
-    if (plan_.compares) {
+    if constexpr (kSmall) {
+      JudgeSmall(SmallMoments{centre, moments.sums, Row(scratch_.squareColumns), moments.excluded,
+                              plan_.taps, plan_.channels, plan_.Outputs()},
+                 scratch_.noise);
+    } else if (plan_.compares) {
       if constexpr (std::is_same_v<T, std::uint8_t> || std::is_same_v<T, std::uint16_t>) {
         JudgeSquares(moments, scratch_.noise);
       }
@@ -314,19 +542,26 @@ class NoiseStrip {
       Judge(moments, scratch_.noise);
     }
     const hn::ScalableTag<T> d;
+    const std::size_t lanes = hn::Lanes(d);
     const auto removed = hn::Set(d, removed_);
     const std::uint8_t* const isolated =
         plan_.channels == 1 ? scratch_.isolated : scratch_.isolatedSamples;
     const bool anyIsolated = dirtyRows_ != 0;
-    for (std::size_t i = 0; i < plan_.Outputs(); i += hn::Lanes(d)) {
+    const auto result = [&](std::size_t i) HWY_ATTR {
       auto isNoise = LoadFlags(d, scratch_.noise + i);
       if (anyIsolated) isNoise = hn::Or(isNoise, LoadFlags(d, isolated + i));
-      hn::StoreU(hn::IfThenElse(isNoise, removed, hn::LoadU(d, centre + i)), d,
-                 scratch_.results + i);
-    }
+      return hn::IfThenElse(isNoise, removed, hn::LoadU(d, centre + i));
+    };
     if (!Centre().dirty) {
-      std::memcpy(strip_.Output(y), scratch_.results, plan_.Outputs() * sizeof(T));
+      T* const output = strip_.Output(y);
+      std::size_t i = 0;
+      for (; i + lanes <= plan_.Outputs(); i += lanes) hn::StoreU(result(i), d, output + i);
+      hn::StoreU(result(i), d, scratch_.results);
+      std::memcpy(output + i, scratch_.results, (plan_.Outputs() - i) * sizeof(T));
       return;
+    }
+    for (std::size_t i = 0; i < plan_.Outputs(); i += lanes) {
+      hn::StoreU(result(i), d, scratch_.results + i);
     }
     const std::uint8_t* const flags = Centre().flags + half_;
     strip_.Merge(y, scratch_.results, [&](std::size_t x) { return flags[x] != 0; });
@@ -336,8 +571,10 @@ class NoiseStrip {
     if (columnsReady_) {
       WindowSums(Row<Sum>(scratch_.columns), plan_.taps, plan_.channels, plan_.Outputs(),
                  Row<Sum>(scratch_.levels), scratch_.pitch, Stores<Sum>{Row<Sum>(scratch_.sums)});
-      WindowSums(Row(scratch_.squareColumns), plan_.taps, plan_.channels, plan_.Outputs(),
-                 Row(scratch_.levels), scratch_.pitch, Stores<Acc>{Row(scratch_.squares)});
+      if constexpr (!kSmall) {
+        WindowSums(Row(scratch_.squareColumns), plan_.taps, plan_.channels, plan_.Outputs(),
+                   Row(scratch_.levels), scratch_.pitch, Stores<Acc>{Row(scratch_.squares)});
+      }
     } else if constexpr (std::is_same_v<Acc, double>) {
       for (std::size_t r = 0; r < plan_.taps; ++r) scratch_.ordered[r] = Window(r).samples;
       OrderedMoments(scratch_.ordered, plan_.taps, plan_.channels, plan_.Outputs(), scratch_.sums,
@@ -416,6 +653,7 @@ HWY_ATTR void RunBand(const NoiseJob<T>& job, std::ptrdiff_t begin, std::ptrdiff
   if (plan.taps == 1) return NoiseRows(job, begin, end);
   if (begin == end || plan.Outputs() == 0) return;
   if constexpr (std::is_same_v<T, std::uint8_t>) {
+    if (plan.small) return RunStrips<T, std::int16_t>(job, plan, begin, end, memory);
     if (plan.integers) return RunStrips<T, std::int32_t>(job, plan, begin, end, memory);
   }
   RunStrips<T, double>(job, plan, begin, end, memory);

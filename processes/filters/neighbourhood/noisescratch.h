@@ -17,6 +17,7 @@ struct NoisePlan {
   std::size_t channels;  ///< samples per pixel
   std::size_t strip;     ///< columns that are processed at a time, so that their rows stay in cache
   bool integers;         ///< bytes whose sums and variances fit 32 bits
+  bool small;            ///< bytes in windows of up to five by five
   bool compares;         ///< the decision is made by comparing squares where that is sure
 
   std::size_t Window() const { return taps * taps; }
@@ -28,24 +29,28 @@ struct NoisePlan {
 
   template <typename T>
   static NoisePlan Of(const NoiseJob<T>& job) {
-    constexpr std::size_t kStripSamples = 1024;
     constexpr std::size_t kStripTaps = 16;
+    constexpr bool kBytes = std::is_same_v<T, std::uint8_t>;
+    constexpr bool kFewBits = kBytes || std::is_same_v<T, std::uint16_t>;
     NoisePlan plan{};
     plan.taps = 2 * static_cast<std::size_t>(job.half) + 1;
     plan.channels = static_cast<std::size_t>(job.input.Channels());
+    plan.integers = kBytes && plan.Window() <= kMostIntegers;
+    plan.small = kBytes && plan.taps <= kMostSmallTaps;
+    plan.compares = kFewBits && plan.Window() <= kMostCompared;
+    const std::size_t samples = plan.small ? 2048 : 1024;
     plan.strip = std::min(
-        std::max(kStripSamples / std::max<std::size_t>(plan.channels, 1), kStripTaps * plan.taps),
+        std::max(samples / std::max<std::size_t>(plan.channels, 1), kStripTaps * plan.taps),
         static_cast<std::size_t>(job.output.Width()));
-    constexpr bool kSmall = std::is_same_v<T, std::uint8_t> || std::is_same_v<T, std::uint16_t>;
-    plan.integers = std::is_same_v<T, std::uint8_t> && plan.Window() <= kMostIntegers;
-    plan.compares = kSmall && plan.Window() <= kMostCompared;
     return plan;
   }
 
  private:
   // n * sum of squares <= n * n * 255 * 255 < 2^31.
   static constexpr std::size_t kMostIntegers = 181;
-  // See `CompareDoubles`.
+  // See `JudgeSmall`.
+  static constexpr std::size_t kMostSmallTaps = 5;
+  // See `JudgeSquares`.
   static constexpr std::size_t kMostCompared = 4096;
 };
 

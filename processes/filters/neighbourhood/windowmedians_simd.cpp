@@ -1,8 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "processes/filters/neighbourhood/windowmedians_simd.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdint>
+#include <cstring>
+#include <type_traits>
 #include <utility>
 
 // Targets that share their kernels with another one, and those whose vectors may be wider than the
@@ -28,6 +31,9 @@ namespace zarn::processes::filters::HWY_NAMESPACE {
 // below it and as many at or above as lie right of and under it. So it can be in the middle only
 // near the diagonal that goes up, from the corner at the bottom left, and of the values on a line
 // parallel to it again only some: those lines are sorted, and then what is left.
+//
+// Neighbouring windows share pairs of columns as well: the values of each rank are sorted in pairs
+// first, which merging the rows of a window begins with.
 //
 // Keys that do not count are filled in with the lowest and the highest key in turn. Within a column
 // the lowest begins, so a column with an odd number of them has one lowest key too many; two such
@@ -68,6 +74,59 @@ struct Candidates<7, true> {
   static constexpr std::array<LineSpan, 6> kLines = {
       {{4, 4, 1}, {5, 3, 3}, {6, 2, 5}, {7, 0, 3}, {8, 0, 2}, {9, 0, 1}}};
 };
+
+/// The scratch of a block of windows: for each rank the values of all columns, and the lower and
+/// the higher ones of each column and the next.
+template <typename Key>
+struct SortedColumns {
+  Key* scratch;
+  std::size_t taps;
+  std::size_t step;
+  std::size_t pitch;
+
+  Key* Column(std::size_t rank) const { return scratch + rank * pitch; }
+  Key* Low(std::size_t rank) const { return scratch + (taps + rank) * pitch; }
+  Key* High(std::size_t rank) const { return scratch + (2 * taps + rank) * pitch; }
+  /// All bits set for columns with an odd number of filled-in keys, else 0.
+  Key* Odd() const { return scratch + 3 * taps * pitch; }
+};
+
+/// Sorts four values that come as two sorted pairs.
+template <class V>
+HWY_INLINE void MergePairs(V* v) {
+  SortPair(v[0], v[2]);
+  SortPair(v[1], v[3]);
+  SortPair(v[1], v[2]);
+}
+/// Sorts values that come as sorted pairs and one more. Written as a choice of ranks, so that those
+/// nobody looks at cost nothing.
+template <class V>
+HWY_INLINE void SortPairs(V* v, std::integral_constant<std::size_t, 5>) {
+  MergePairs(v);
+  const V added = v[4];
+  v[4] = hn::Max(v[3], added);
+  v[3] = hn::Max(v[2], hn::Min(v[3], added));
+  v[2] = hn::Max(v[1], hn::Min(v[2], added));
+  v[1] = hn::Max(v[0], hn::Min(v[1], added));
+  v[0] = hn::Min(v[0], added);
+}
+template <class V>
+HWY_INLINE void SortPairs(V* v, std::integral_constant<std::size_t, 7>) {
+  MergePairs(v);
+  const V low = hn::Min(v[4], v[6]);
+  const V middle = hn::Max(v[4], hn::Min(v[5], v[6]));
+  const V high = hn::Max(v[5], v[6]);
+  // Batcher's merge of four and three: those in even places, those in odd ones, both together.
+  V even[4] = {hn::Min(v[0], low), hn::Max(v[0], low), hn::Min(v[2], high), hn::Max(v[2], high)};
+  SortPair(even[1], even[2]);
+  V odd[3] = {hn::Min(v[1], middle), hn::Max(v[1], middle), v[3]};
+  SortPair(odd[1], odd[2]);
+  v[0] = even[0];
+  for (std::size_t i = 0; i < 3; ++i) {
+    v[2 * i + 1] = hn::Min(odd[i], even[i + 1]);
+    v[2 * i + 2] = hn::Max(odd[i], even[i + 1]);
+  }
+}
 
 template <std::size_t kTaps, bool kHoles>
 struct Selection {
@@ -121,38 +180,49 @@ struct Selection {
   }
 
   /// Loads the values of one rank in all columns and sorts them.
-  template <class D, typename Key, class V, std::size_t... kColumn>
-  static HWY_INLINE void LoadRank(D d, const Key* ranks, std::size_t step, V* row,
-                                  std::index_sequence<kColumn...>) {
-    ((row[kColumn] = hn::LoadU(d, ranks + kColumn * step)), ...);
-    SortVectors<kTaps>(row);
+  template <class D, typename Key, class V>
+  static HWY_INLINE void LoadRank(D d, const SortedColumns<Key>& rows, std::size_t rank,
+                                  std::size_t i, V* row) {
+    const Key* const columns = rows.Column(rank) + i;
+    if constexpr (kTaps == 3) {
+      row[0] = hn::LoadU(d, columns);
+      row[1] = hn::LoadU(d, columns + rows.step);
+      row[2] = hn::LoadU(d, columns + 2 * rows.step);
+      SortVectors<3>(row);
+    } else {
+      const Key* const low = rows.Low(rank) + i;
+      const Key* const high = rows.High(rank) + i;
+      for (std::size_t pair = 0; pair < kTaps - 1; pair += 2) {
+        row[pair] = hn::LoadU(d, low + pair * rows.step);
+        row[pair + 1] = hn::LoadU(d, high + pair * rows.step);
+      }
+      row[kTaps - 1] = hn::LoadU(d, columns + (kTaps - 1) * rows.step);
+      SortPairs(row, std::integral_constant<std::size_t, kTaps>());
+    }
   }
   template <class D, typename Key, class V, std::size_t... kRank>
-  static HWY_INLINE void LoadGrid(D d, const Key* columns, std::size_t pitch, std::size_t step,
-                                  V* grid, std::index_sequence<kRank...>) {
-    (LoadRank(d, columns + kRank * pitch, step, grid + kRank * kTaps,
-              std::make_index_sequence<kTaps>()),
-     ...);
+  static HWY_INLINE void LoadGrid(D d, const SortedColumns<Key>& rows, std::size_t i, V* grid,
+                                  std::index_sequence<kRank...>) {
+    (LoadRank(d, rows, kRank, i, grid + kRank * kTaps), ...);
   }
 };
 
-/// The median of each lane's window from its sorted columns; `columns` starts at the window's left.
-/// `oddColumns`, where given, has all bits set for columns with an odd number of filled-in keys.
+/// The median of each lane's window from its sorted columns, from column i on.
 template <std::size_t kTaps, bool kHoles, class D, typename Key>
-HWY_INLINE hn::Vec<D> MedianOfColumns(D d, const Key* columns, std::size_t pitch, std::size_t step,
-                                      const Key* oddColumns) {
+HWY_INLINE hn::Vec<D> MedianOfColumns(D d, const SortedColumns<Key>& rows, std::size_t i) {
   using V = hn::Vec<D>;
   using Select = Selection<kTaps, kHoles>;
   V grid[kTaps * kTaps];
-  Select::LoadGrid(d, columns, pitch, step, grid, std::make_index_sequence<kTaps>());
+  Select::LoadGrid(d, rows, i, grid, std::make_index_sequence<kTaps>());
   V candidates[Select::Count()];
   Select::TakeLines(grid, candidates, std::make_index_sequence<Select::kLineCount>());
   SortVectors<Select::Count()>(candidates);
   V median = candidates[Select::kMedian];
   if constexpr (kHoles) {
+    const Key* const oddColumns = rows.Odd() + i;
     auto odd = hn::LoadU(d, oddColumns);
     for (std::size_t column = 1; column < kTaps; ++column) {
-      odd = hn::Add(odd, hn::LoadU(d, oddColumns + column * step));
+      odd = hn::Add(odd, hn::LoadU(d, oddColumns + column * rows.step));
     }
     // (Minus their number, counting down from zero.)
     const auto number = hn::Sub(hn::Zero(d), odd);
@@ -173,41 +243,64 @@ HWY_INLINE void FillIn(D d, const Key* excluded, hn::Vec<D>& fill, hn::Vec<D>& k
   fill = hn::Xor(fill, isExcluded);
 }
 
-/// Sorts the columns, excluded keys filled in, and marks those with an odd number of them.
+/// Sorts `length` columns from column `first` on, excluded keys filled in, and marks those with an
+/// odd number of them.
 template <bool kHoles, typename Key, std::size_t... kRow>
-HWY_ATTR void SortColumns(const KeyWindows<Key>& windows, std::index_sequence<kRow...>) {
+HWY_ATTR void SortColumns(const KeyWindows<Key>& windows, std::size_t first, std::size_t length,
+                          const SortedColumns<Key>& sorted, std::index_sequence<kRow...>) {
   constexpr std::size_t kTaps = sizeof...(kRow);
   const hn::ScalableTag<Key> d;
-  const Key* const rows[kTaps] = {windows.rows[kRow]...};
-  const Key* const excluded[kTaps] = {(kHoles ? windows.excluded[kRow] : nullptr)...};
-  Key* const columns[kTaps] = {windows.columns + kRow * windows.pitch...};
-  Key* const odd = windows.columns + kTaps * windows.pitch;
-  const std::size_t length = windows.count + (kTaps - 1) * windows.step;
+  const Key* const rows[kTaps] = {windows.rows[kRow] + first...};
+  const Key* const excluded[kTaps] = {(kHoles ? windows.excluded[kRow] + first : nullptr)...};
+  Key* const columns[kTaps] = {sorted.Column(kRow)...};
   for (std::size_t i = 0; i < length; i += hn::Lanes(d)) {
     hn::Vec<decltype(d)> v[kTaps] = {hn::LoadU(d, rows[kRow] + i)...};
     if constexpr (kHoles) {
       auto fill = hn::Zero(d);
       (FillIn(d, excluded[kRow] + i, fill, v[kRow]), ...);
-      hn::StoreU(fill, d, odd + i);
+      hn::StoreU(fill, d, sorted.Odd() + i);
     }
     SortVectors<kTaps>(v);
     (hn::StoreU(v[kRow], d, columns[kRow] + i), ...);
   }
 }
 
+/// Sorts the values of each rank in pairs of neighbouring columns, for the first `length` columns.
+template <typename Key>
+HWY_ATTR void PairColumns(const SortedColumns<Key>& rows, std::size_t length) {
+  const hn::ScalableTag<Key> d;
+  for (std::size_t rank = 0; rank < rows.taps; ++rank) {
+    const Key* const columns = rows.Column(rank);
+    Key* const low = rows.Low(rank);
+    Key* const high = rows.High(rank);
+    for (std::size_t i = 0; i < length; i += hn::Lanes(d)) {
+      const auto left = hn::LoadU(d, columns + i);
+      const auto right = hn::LoadU(d, columns + i + rows.step);
+      hn::StoreU(hn::Min(left, right), d, low + i);
+      hn::StoreU(hn::Max(left, right), d, high + i);
+    }
+  }
+}
+
 template <std::size_t kTaps, bool kHoles, typename Key>
 HWY_ATTR void FindInRow(const KeyWindows<Key>& windows) {
-  SortColumns<kHoles>(windows, std::make_index_sequence<kTaps>());
   const hn::ScalableTag<Key> d;
-  const Key* const columns = windows.columns;
-  const std::size_t pitch = windows.pitch;
-  const std::size_t step = windows.step;
-  const std::size_t count = windows.count;
-  Key* const medians = windows.medians;
-  for (std::size_t i = 0; i < count; i += hn::Lanes(d)) {
-    const auto median =
-        MedianOfColumns<kTaps, kHoles>(d, columns + i, pitch, step, columns + kTaps * pitch + i);
-    hn::StoreU(median, d, medians + i);
+  const std::size_t lanes = hn::Lanes(d);
+  const SortedColumns<Key> rows{windows.scratch, kTaps, windows.step,
+                                MedianPitch<Key>(kTaps, windows.step)};
+  constexpr std::size_t kBlock = kMedianBlockBytes / sizeof(Key);
+  HWY_ALIGN Key rest[HWY_MAX_BYTES / sizeof(Key)] = {};
+  for (std::size_t first = 0; first < windows.count; first += kBlock) {
+    const std::size_t count = std::min(kBlock, windows.count - first);
+    const std::size_t length = count + (kTaps - 1) * windows.step;
+    SortColumns<kHoles>(windows, first, length, rows, std::make_index_sequence<kTaps>());
+    if constexpr (kTaps > 3) PairColumns(rows, length - windows.step);
+    Key* const medians = windows.medians + first;
+    const std::size_t whole = count - count % lanes;
+    for (std::size_t i = 0; i < count; i += lanes) {
+      hn::StoreU(MedianOfColumns<kTaps, kHoles>(d, rows, i), d, i < whole ? medians + i : rest);
+    }
+    std::memcpy(medians + whole, rest, (count - whole) * sizeof(Key));
   }
 }
 

@@ -150,6 +150,19 @@ TEST_F(WindowFilters, TakeTheBackgroundFromTheNoDataValueOfTheOutput) {
   expect("remove-blobs", {"--size", "99999999999"}, 5, 5, 5);
 }
 
+TEST_F(WindowFilters, TakeForNoDataWhatEqualsItExactly) {
+  Image image(9, 9, 1, GDT_Float32);
+  std::fill(image.values.begin(), image.values.end(), 0);
+  image.At(4, 4, 0) = image.At(0, 8, 0) = 1e-20;
+  Write(image, folder_ / "in.tif", {}, DeclareNoData(0));
+  for (const int size : {1, 3}) {
+    const Image output =
+        Filter("remove-blobs", {"--size", std::to_string(size), "--dst-nodata", "-9"});
+    EXPECT_EQ(output.At(4, 4, 0), size == 1 ? 1e-20F : -9);
+    EXPECT_EQ(output.At(3, 4, 0), -9);
+  }
+}
+
 TEST_F(WindowFilters, SayWhatIsMissing) {
   const Image image = NoiseImage(9, 9, 2, GDT_Byte, {}, 1);
   Write(image, folder_ / "in.tif");
@@ -157,6 +170,11 @@ TEST_F(WindowFilters, SayWhatIsMissing) {
     ExpectOneLine(Fail(command, {}), 2, "--background");
     ExpectOneLine(Fail(command, {"--src-nodata", "1,2"}), 2, "different no-data values");
     ExpectOneLine(Fail(command, {"--background", "x"}), 2, "--background");
+    // Not the no-data value in its place.
+    for (const char* const value : {"none", "300"}) {
+      ExpectOneLine(Fail(command, {"--dst-nodata", "9", "--background", value}), 2,
+                    std::string("--background ") + value);
+    }
   }
   ExpectOneLine(Fail("median", {"--size", "8"}), 2, "from 1 to 7");
 }

@@ -32,7 +32,7 @@ TEST_P(DistanceKernels, GiveTheBitsOfTheDefinition) {
   for (int round = 0; round < 3000; ++round) {
     // On centres, tiny, huge or anywhere; lying, standing, without length.
     const double scale = random.Pick<double>({0.5, 1e-170, 1e9, 40.123, 3.7});
-    std::vector<PolygonEdge> edges(1 + random.Below(5));
+    std::vector<PolygonEdge> edges(1 + random.Below(random.Percent(30) ? kMostGrouped : 5));
     const DistanceRow at{.squared = nullptr, .left = 1000, .row = 77};
     double minX = kInfinity;
     double maxX = -kInfinity;
@@ -58,12 +58,26 @@ TEST_P(DistanceKernels, GiveTheBitsOfTheDefinition) {
     const std::size_t end = first + random.Below(64);
     const double slack = 1e-6 + 1e-13 * 1e11;
     std::vector<double> lowered = known;
-    LowerDistances({.edges = edges.data(),
-                    .count = edges.size(),
-                    .minX = minX - slack,
-                    .maxX = maxX + slack,
-                    .above = std::max(above - slack, 0.0)},
-                   first, end, {.squared = lowered.data(), .left = at.left, .row = at.row});
+    const NearEdges near{.edges = edges.data(),
+                         .count = edges.size(),
+                         .minX = minX - slack,
+                         .maxX = maxX + slack,
+                         .above = std::max(above - slack, 0.0)};
+    LowerDistances(near, first, end, {.squared = lowered.data(), .left = at.left, .row = at.row});
+    std::vector<double> together = known;
+    const bool isShared = std::ranges::all_of(
+        edges, [&](const PolygonEdge& edge) { return edge.firstBand <= at.row; });
+    if (isShared && edges.size() > 1) {
+      GroupedEdges grouped(edges.size() + 2);
+      NearEdges inParts = near;
+      inParts.grouped = &grouped;
+      inParts.place = GroupedEdges::kPart * random.Below(2);
+      grouped.Put(edges.data(), edges.size(), slack, inParts.place);
+      LowerDistances(inParts, first, end,
+                     {.squared = together.data(), .left = at.left, .row = at.row});
+    } else {
+      together = lowered;
+    }
     std::vector<NarrowEdge> narrow;
     for (const PolygonEdge& e : edges) {
       narrow.push_back({e.x0, e.y0, e.x1, e.y1, e.firstBand, e.lastBand,
@@ -81,9 +95,11 @@ TEST_P(DistanceKernels, GiveTheBitsOfTheDefinition) {
       if (i < first || i >= end) {
         ASSERT_TRUE(lowered[i] == known[i] || lowered[i] == smallest);
         ASSERT_TRUE(narrowed[i] == known[i] || narrowed[i] == smallest);
+        ASSERT_TRUE(together[i] == known[i] || together[i] == smallest);
       } else {
         ASSERT_EQ(lowered[i], smallest) << "round " << round << " column " << i;
         ASSERT_EQ(narrowed[i], smallest) << "round " << round << " column " << i;
+        ASSERT_EQ(together[i], smallest) << "round " << round << " column " << i;
       }
     }
     const std::uint64_t inside = random.Next();
@@ -94,6 +110,11 @@ TEST_P(DistanceKernels, GiveTheBitsOfTheDefinition) {
       const double weight = std::sqrt(lowered[i]) / blend;
       ASSERT_EQ(weights[i], (inside >> i & 1) != 0 ? weight : -weight);
       ASSERT_EQ((band >> i & 1) != 0, weight < 1);
+    }
+    BoundBelow(weights.data(), blend, 1.5, blend + 0.5);
+    for (std::size_t i = 0; i < kWordColumns; ++i) {
+      const double bound = std::min(std::sqrt(lowered[i]) + 1.5, blend + 0.5);
+      ASSERT_NEAR(weights[i], bound * bound, 1e-12 * bound * bound);
     }
   }
 }

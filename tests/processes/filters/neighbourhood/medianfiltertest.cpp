@@ -18,6 +18,7 @@ namespace {
 using testsupport::AgreesWithReference;
 using testsupport::FilterWindows;
 using testsupport::ForEachVectorTarget;
+using testsupport::RandomNumbers;
 using testsupport::TestBlock;
 using testsupport::TestedMedian;
 using testsupport::WindowParameters;
@@ -65,10 +66,42 @@ TEST(MedianFilter, OrdersWhatComparisonsDoNot) {
                                              -std::nan(""), -std::nan(""), -std::nan("")})));
 }
 
+// Rows without anything negative go another way than windows that hold some.
+template <typename T>
+void CompareRowsOfEitherSign(T strange) {
+  RandomNumbers random(6);
+  for (const int size : {3, 5, 7}) {
+    const auto half = static_cast<std::uint32_t>(size / 2);
+    TestBlock<T> input({.width = 70, .height = 40, .marginX = half, .marginY = half});
+    for (std::ptrdiff_t y = -std::ptrdiff_t{half}; y < 40 + std::ptrdiff_t{half}; ++y) {
+      const bool plain = y % 20 < 12;
+      for (std::ptrdiff_t x = -std::ptrdiff_t{half}; x < 70 + std::ptrdiff_t{half}; ++x) {
+        const auto sample = static_cast<T>(random.Below(50));
+        input.At(x, y) = plain || random.Percent(60) ? sample : static_cast<T>(-sample);
+        if (!plain && random.Percent(20)) input.At(x, y) = strange;
+      }
+    }
+    const TestBlock<T> output({.width = 70, .height = 40});
+    std::vector<std::uint8_t> mask(input.SampleCount(), 1);
+    for (std::uint8_t& byte : mask) byte = random.Percent(10) ? 0 : 1;
+    ForEachVectorTarget([&] {
+      for (const std::vector<std::uint8_t>& used : {std::vector<std::uint8_t>(), mask}) {
+        EXPECT_TRUE(AgreesWithReference<TestedMedian>({.kernelSize = size}, input, used, output));
+      }
+    });
+  }
+}
+
+TEST(MedianFilter, SortsRowsOfEitherSign) {
+  CompareRowsOfEitherSign<float>(std::numeric_limits<float>::quiet_NaN());
+  CompareRowsOfEitherSign<double>(-0.0);
+  CompareRowsOfEitherSign<std::int16_t>(std::numeric_limits<std::int16_t>::min());
+}
+
 // Exchanges that find the median of zeros and ones find that of all numbers. A window whose columns
 // hold 0 to all ones stands for all that differ in the order of its samples alone.
 TEST(MedianFilter, FindsTheMedianOfEveryPatternOfZerosAndOnes) {
-  testsupport::RandomNumbers random(5);
+  RandomNumbers random(5);
   for (const std::uint32_t side : {3U, 5U, 7U}) {
     std::vector<std::uint32_t> ones(side, 0);
     std::vector<std::vector<std::uint32_t>> windows;
