@@ -26,7 +26,7 @@ struct MedianPlan {
 
   template <typename T>
   static MedianPlan Of(const MedianJob<T>& job) {
-    constexpr std::size_t kRowBytes = 4096;
+    constexpr std::size_t kRowBytes = 16384;
     constexpr std::size_t kLeastStrip = 128;
     MedianPlan plan{};
     plan.taps = 2 * static_cast<std::size_t>(job.half) + 1;
