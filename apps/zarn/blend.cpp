@@ -82,8 +82,9 @@ BlendPlan PlanBlend(const BlendOptions& options, const RasterSource& source) {
   mosaic.RefusePalette();
   RequireSameBands(source, mosaic);
   const GridPlace place = PlaceOnGrid(mosaic, source);
-  const Window covered = Intersection({0, 0, mosaic.Width(), mosaic.Height()},
-                                      {place.column, place.row, source.Width(), source.Height()});
+  const Window covered =
+      Intersection(Window{0, 0, mosaic.Width(), mosaic.Height()},
+                   Window{place.column, place.row, source.Width(), source.Height()});
   if (IsEmpty(covered)) {
     throw RunError(source.Name() + " misses " + mosaic.Name() +
                    ": they have no pixel in common; compare their extents with gdalinfo");

@@ -99,6 +99,7 @@ class Planner {
     OpenScenes();
     LayGrid();
     PlaceScenes();
+    RequireNeighbours();
     Order();
     if (!options_.cutlines.empty()) {
       AssignCutlines(options_.cutlines, options_.cutlineId, *mosaic_, plan_.scenes);
@@ -136,6 +137,7 @@ class Planner {
   std::string LabelFor(const std::string& name);
   void LayGrid();
   void PlaceScenes();
+  void RequireNeighbours() const;
   void Order();
   void RefuseOutputs() const;
   void RemoveHotSpots(nspio::Counter& progress);
@@ -306,6 +308,32 @@ void Planner::PlaceScenes() {
   plan_.fillsGaps = options_.fillGaps || FindsSeams();
   plan_.stopsOnNoData = options_.stopOnNoData;
   plan_.tileSide = options_.tileSide;
+}
+
+// A scene far off is mostly one that lies in a wrong place, and would make the mosaic huge.
+void Planner::RequireNeighbours() const {
+  if (!options_.extent.empty()) return;
+  const std::vector<ScenePlan>& scenes = plan_.scenes;
+  std::vector<bool> tied(scenes.size(), false);
+  std::vector<std::size_t> open{0};
+  tied[0] = true;
+  while (!open.empty()) {
+    // Scenes that only touch are neighbours too.
+    Window around = scenes[open.back()].covers;
+    open.pop_back();
+    around = {around.x - 1, around.y - 1, around.width + 2, around.height + 2};
+    for (std::size_t i = 0; i < scenes.size(); ++i) {
+      if (tied[i] || !Meet(around, scenes[i].covers)) continue;
+      tied[i] = true;
+      open.push_back(i);
+    }
+  }
+  for (std::size_t i = 0; i < scenes.size(); ++i) {
+    if (tied[i]) continue;
+    throw RunError(scenes[i].File() + " does not overlap " + scenes.front().File() +
+                   ", neither directly nor through the other scenes; leave it out, or give --te if "
+                   "the gap between them is meant");
+  }
 }
 
 void Planner::Order() {
