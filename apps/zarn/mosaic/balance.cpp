@@ -138,7 +138,7 @@ class Network {
     std::vector<Correction> corrections;
     for (const ScenePlan& plan : before) corrections.emplace_back(plan);
     for (int round = 0; round < kRounds; ++round) {
-      const std::vector<std::vector<double>> targets = Targets(
+      std::vector<std::vector<double>> targets = Targets(
           order_.size(),
           [&](std::size_t scene, const Cell& cell) { return Corrected(corrections[scene], cell); });
       for (std::size_t i = holdsFirst ? 1 : 0; i < order_.size(); ++i) {

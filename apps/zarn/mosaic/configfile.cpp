@@ -2,6 +2,7 @@
 #include "apps/zarn/mosaic/configfile.h"
 
 #include <CLI/CLI.hpp>
+#include <exception>
 #include <fstream>
 #include <nlohmann/json.hpp>
 #include <vector>
@@ -38,6 +39,11 @@ void Set(CLI::Option& option, const json& value, const std::string& place) {
   }
   if (isFlag) {
     if (value.get<bool>()) option.add_result("true");
+  } else if (value.is_array() && option.get_items_expected_max() == 1) {
+    // A list that the command line takes as one text.
+    std::string text;
+    for (const json& entry : value) text += (text.empty() ? "" : ",") + TextOf(entry);
+    option.add_result(text);
   } else if (value.is_array()) {
     for (const json& entry : value) option.add_result(TextOf(entry));
   } else {
@@ -46,7 +52,7 @@ void Set(CLI::Option& option, const json& value, const std::string& place) {
   if (option.count() == 0) return;
   try {
     option.run_callback();
-  } catch (const CLI::ParseError& error) {
+  } catch (const std::exception& error) {
     throw UsageError(place + ": " + error.what());
   }
 }
@@ -59,15 +65,14 @@ void ApplyConfig(const std::string& file, CLI::App& command) {
   json config;
   try {
     config = json::parse(stream);
-  } catch (const json::exception& error) {
+  } catch (const std::exception& error) {
     throw UsageError(file + " is not JSON: " + error.what());
   }
   if (!config.is_object()) throw UsageError(file + ": expected an object of options");
   for (const auto& [key, value] : config.items()) {
     CLI::Option* const option = Find(command, key);
     if (option == nullptr || key == "config" || key == "help") {
-      throw UsageError(file + ": there is no option '" + key + "' (see " + command.get_name() +
-                       " --help)");
+      throw UsageError(file + ": there is no option '" + key + "' (see zarn mosaic --help)");
     }
     if (option->count() == 0) Set(*option, value, file + ": '" + key + "'");
   }

@@ -5,6 +5,7 @@
 #include <ogrsf_frmts.h>
 
 #include <filesystem>
+#include <map>
 #include <set>
 
 #include "apps/zarn/cutlinefile.h"
@@ -62,14 +63,20 @@ Polygon PolygonOf(const processes::filters::PolygonParam& param) {
 }  // namespace
 
 void AssignCutlines(const std::string& file, const std::string& field, const RasterSource& mosaic,
-                    std::vector<ScenePlan>& scenes) {
+                    bool partial, std::vector<ScenePlan>& scenes) {
   const std::string key = field.empty() ? "scene" : field;
   const std::set<std::string> values = ValuesOf(file, key);
+  std::map<std::string, std::string> owners;
   for (ScenePlan& scene : scenes) {
     std::string where;
     for (const std::string& name :
          {scene.label, std::filesystem::path(scene.File()).filename().string(), scene.File()}) {
       if (!values.contains(name)) continue;
+      const auto [other, fresh] = owners.emplace(name, scene.File());
+      if (!fresh) {
+        throw RunError("the cutline '" + name + "' in " + file + " may be that of " +
+                       other->second + " or of " + scene.File() + "; name them by their paths");
+      }
       where = Quoted(key, '"') + " = " + Quoted(name, '\'');
       break;
     }
@@ -78,7 +85,8 @@ void AssignCutlines(const std::string& file, const std::string& field, const Ras
                      " is '" + scene.label + "'; add one, or leave the scene out");
     }
     const RasterPolygon polygon = LoadCutline({.file = file, .layer = {}, .where = where}, mosaic);
-    if (!Meet(polygon.PixelsWithin({mosaic.Width(), mosaic.Height()}, 0), scene.covers)) {
+    if (!partial &&
+        !Meet(polygon.PixelsWithin({mosaic.Width(), mosaic.Height()}, 0), scene.covers)) {
       throw RunError("the cutline of " + scene.File() + " in " + file +
                      " misses it; compare their extents with gdalinfo and ogrinfo, or leave the "
                      "scene out");

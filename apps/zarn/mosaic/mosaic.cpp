@@ -102,8 +102,8 @@ void AddSeams(Declarer& declare, CLI::App& command, MosaicOptions& options) {
                     "Order of pasting, later scenes on top: listed, reverse, or resolution (the "
                     "finest last)");
   command.add_flag("--fill-gaps", options.fillGaps,
-                   "Where a scene has no data within its cutline, take what its neighbours have; "
-                   "always done along seams that were found here");
+                   "Where a scene has no data within its cutline, take what its neighbours have "
+                   "near theirs; always done along seams that were found here");
   command.add_flag("--stop-on-nodata", options.stopOnNoData,
                    "Fail if a scene is without data anywhere within its cutline");
 }
@@ -169,9 +169,10 @@ std::shared_ptr<ParsedOptions> AddMosaicOptions(CLI::App& command) {
   AddSeams(declare, command, options);
   AddColours(declare, command, options);
   AddOutput(declare, command, options);
-  declare.Add("--config", parsed->config, "FILE",
-              "JSON object with any of these options by their long names (\"scenes\" for SCENES); "
-              "the command line counts more");
+  declare.Add(
+      "--config", parsed->config, "FILE",
+      "JSON object with any of these options by their long names (\"scenes\" for SCENES and OUT); "
+      "the command line counts more");
   AddWork(declare, command, options.work);
   return parsed;
 }
@@ -183,6 +184,8 @@ const MosaicOptions& Settle(ParsedOptions& parsed, CLI::App& command) {
     throw UsageError("give at least one scene and then the output (see zarn mosaic --help)");
   }
   MosaicOptions& options = parsed.mosaic;
+  options.config = parsed.config;
+  options.plan = parsed.plan;
   options.output.target = parsed.files.back();
   options.scenes.assign(parsed.files.begin(), parsed.files.end() - 1);
   if (options.tileSide % 16 != 0) throw UsageError("--tile-size: it must be a multiple of 16");
@@ -261,11 +264,20 @@ void AddMosaicCommand(CLI::App& app) {
   AddPlanCommand(command);
   AddRunCommand(command);
   AddFinishCommand(command);
+  command.parse_complete_callback([&command] {
+    if (command.get_subcommands().empty()) return;
+    for (const CLI::Option* const option : command.get_options()) {
+      if (option->count() == 0) continue;
+      throw UsageError(option->get_name() + " has to come after 'zarn mosaic " +
+                       command.get_subcommands().front()->get_name() + "'");
+    }
+  });
   command.callback([parsed, &command] {
     if (command.get_subcommands().empty()) MakeMosaic(Settle(*parsed, command));
   });
   command.footer(
-      "Every scene is read once, in windows, freed of its hot spot, brought onto the grid of OUT, "
+      "Scenes are read in windows (twice where colours or seams depend on all of them), freed of "
+      "its hot spot, brought onto the grid of OUT, "
       "balanced and pasted along its cutline. Pixels that are no-data, NaN, transparent (alpha 0) "
       "or masked take no part, and no pixel with data becomes no-data. Without --cutlines seams "
       "follow the least visible way through each overlap. The result depends neither on --threads "

@@ -80,6 +80,7 @@ void MosaicFile::WriteMap(const TileBuffers& tile) {
 
 void MosaicFile::Annotate(const std::string& key, const std::string& value) {
   image_.Dataset().SetMetadataItem(key.c_str(), value.c_str());
+  if (map_) map_->Dataset().SetMetadataItem(key.c_str(), value.c_str());
 }
 
 void MosaicFile::Publish(nspio::Counter& progress) {

@@ -29,7 +29,7 @@ class MosaicFile {
   /// Writes a tile that lies at `window.x - left`, `window.y - top` of the file. Tiles of a file
   /// with blocks across tiles come row by row.
   void Write(TileBuffers& tile, std::int64_t left, std::int64_t top);
-  /// Gives the image a metadata item; to be done before the first tile.
+  /// Gives the files a metadata item; to be done before the first tile.
   void Annotate(const std::string& key, const std::string& value);
   /// Whether `Publish` still has a large part of the writing to do.
   bool CopiesAtTheEnd() const { return image_.CopiesAtTheEnd(); }

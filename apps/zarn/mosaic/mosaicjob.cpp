@@ -52,17 +52,32 @@ class TileFolder {
   std::string Map(std::size_t tile) const { return Name(tile, ".map.tif"); }
   const std::string& Fingerprint() const { return fingerprint_; }
 
-  /// Whether a tile of this very plan is there, with its map if it has to have one.
+  /// Whether a tile of this very plan is there, whole, with its map if it has to have one.
   bool Has(std::size_t tile, bool withMap) const {
-    std::error_code error;
-    if (!fs::exists(Image(tile), error)) return false;
-    if (withMap && !fs::exists(Map(tile), error)) return false;
-    const DatasetPtr dataset = OpenRaster(Image(tile));
-    const char* const made = dataset->GetMetadataItem(kPlanItem);
-    return made != nullptr && fingerprint_ == made;
+    return IsWhole(Image(tile)) && (!withMap || IsWhole(Map(tile)));
   }
 
  private:
+  // Of a file that was cut off the last row cannot be read.
+  bool IsWhole(const std::string& file) const {
+    std::error_code error;
+    if (!fs::exists(file, error)) return false;
+    const DatasetPtr dataset(GDALDataset::Open(file.c_str(), GDAL_OF_RASTER | GDAL_OF_READONLY));
+    if (!dataset) return false;
+    const char* const made = dataset->GetMetadataItem(kPlanItem);
+    if (made == nullptr || fingerprint_ != made) return false;
+    const int width = dataset->GetRasterXSize();
+    std::vector<double> row(static_cast<std::size_t>(width));
+    for (int band = 1; band <= dataset->GetRasterCount(); ++band) {
+      if (dataset->GetRasterBand(band)->RasterIO(GF_Read, 0, dataset->GetRasterYSize() - 1, width,
+                                                 1, row.data(), width, 1, GDT_Float64, 0, 0,
+                                                 nullptr) != CE_None) {
+        return false;
+      }
+    }
+    return true;
+  }
+
   std::string Name(std::size_t tile, const char* extension) const {
     constexpr std::size_t kDigits = 6;
     std::string number = std::to_string(tile + 1);
@@ -92,13 +107,9 @@ OutputGrid PartOf(const OutputGrid& grid, const Window& window) {
   return part;
 }
 
-bool IsVrt(const std::string& format, const std::string& target) {
-  return format.empty() ? fs::path(target).extension() == ".vrt" : EQUAL(format.c_str(), "VRT");
-}
-
 // A VRT holds no pixels; only tiles that stay can be joined by one.
 void RefuseVrt(const OutputOptions& output) {
-  if (!IsVrt(output.format, output.target)) return;
+  if (!IsVrt(output)) return;
   throw UsageError("a VRT joins tiles that are files: use zarn mosaic plan, run and finish");
 }
 
@@ -110,7 +121,7 @@ void RequireTiles(const TileFolder& folder, std::size_t count, bool withMap,
   }
   if (missing.empty()) return;
   throw RunError(std::to_string(missing.size()) + " of " + std::to_string(count) +
-                 " tiles are missing or belong to another plan, the first one being number " +
+                 " tiles are missing, broken or of another plan, the first one being number " +
                  std::to_string(missing.front()) + "; make them with zarn mosaic run " + plan);
 }
 
@@ -264,11 +275,11 @@ void FinishPlan(const std::string& file, const FinishOptions& options, const Wor
   const TileFolder folder(file, Fingerprint(plan));
   const std::vector<TilePlan> tiles = plan.Tiles();
   RequireTiles(folder, tiles.size(), !plan.sourceMap.empty(), file);
-  if (IsVrt(plan.output.format, plan.output.target)) {
+  RequireUnchanged(plan);
+  if (IsVrt(plan.output)) {
     JoinAsVrt(plan, folder, tiles.size(), plan.output.overwrite);
     return;
   }
-  RequireUnchanged(plan);
   const RasterSource like = FirstScene(plan);
   MosaicFile result(plan, like, plan.grid, plan.output, plan.sourceMap);
   TerminalProgress progress(work.quiet);

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <cmath>
 #include <cstdlib>
 #include <filesystem>
@@ -155,6 +156,37 @@ ScenePlan SceneOf(const Json& json) {
   return scene;
 }
 
+void Require(bool sound, const std::string& what) {
+  if (!sound) throw UsageError(what);
+}
+
+// What would read beyond an array, or not at all, if somebody had edited the plan.
+void RequireSound(const MosaicPlan& plan) {
+  Require(!plan.scenes.empty(), "it has no scenes");
+  Require(plan.grid.width > 0 && plan.grid.height > 0, "its grid has no pixels");
+  Require(plan.tileSide >= 16 && plan.tileSide % 16 == 0, "tileSide is not a multiple of 16");
+  Require(
+      plan.resampling == "nearest" || plan.resampling == "bilinear" || plan.resampling == "cubic",
+      "resampling '" + plan.resampling + "' is unknown");
+  Require(plan.filter.name.empty() || plan.filter.name == "average" || plan.filter.name == "median",
+          "filter '" + plan.filter.name + "' is unknown");
+  Require(plan.filter.size >= 1 && plan.filter.size <= 7, "the filter's size is not from 1 to 7");
+  for (const ScenePlan& scene : plan.scenes) {
+    const Polygon& cutline = scene.cutline;
+    const std::size_t vertices = cutline.vertices.size() / 2;
+    bool sound = cutline.vertices.size() % 2 == 0 && cutline.Empty() == cutline.starts.empty();
+    std::int64_t before = -1;
+    for (const std::int32_t start : cutline.starts) {
+      sound &= start > before && static_cast<std::size_t>(start) < vertices;
+      before = start;
+    }
+    Require(sound && (cutline.Empty() || cutline.starts.front() == 0),
+            "the cutline of " + scene.label + " is broken");
+    Require(scene.gains.size() == scene.offsets.size(),
+            "gains and offsets of " + scene.label + " differ in number");
+  }
+}
+
 MosaicPlan PlanOf(const Json& json) {
   if (json.at("kind").get<std::string>() != kKind || json.at("version").get<int>() != kVersion) {
     throw UsageError("it is of another kind or version");
@@ -177,7 +209,7 @@ MosaicPlan PlanOf(const Json& json) {
   plan.stopsOnNoData = json.at("stopsOnNoData").get<bool>();
   plan.tileSide = json.at("tileSide").get<std::int64_t>();
   for (const Json& scene : json.at("scenes")) plan.scenes.push_back(SceneOf(scene));
-  if (plan.scenes.empty() || plan.tileSide < 1) throw UsageError("it has no scenes");
+  RequireSound(plan);
   return plan;
 }
 
@@ -272,14 +304,43 @@ std::string Fingerprint(const MosaicPlan& plan) {
   return text;
 }
 
+std::string AbsoluteFile(const std::string& name) {
+  std::error_code error;
+  return fs::exists(name, error) ? fs::absolute(name, error).string() : name;
+}
+
+std::vector<FileState> FilesOf(const RasterSource& source) {
+  const std::string name = AbsoluteFile(source.Name());
+  std::vector<FileState> files{FileState::Of(name)};
+  const CPLStringList parts(source.Dataset().GetFileList());
+  for (int i = 0; i < parts.size(); ++i) {
+    const std::string part = AbsoluteFile(parts[i]);
+    if (part != name) files.push_back(FileState::Of(part));
+  }
+  return files;
+}
+
+bool IsVrt(const OutputOptions& output) {
+  return output.format.empty() ? fs::path(output.target).extension() == ".vrt"
+                               : EQUAL(output.format.c_str(), "VRT");
+}
+
 void RequireUnchanged(const MosaicPlan& plan) {
+  const auto refuse = [](const std::string& file, const char* change) {
+    throw RunError(file + change +
+                   " since the plan was made; make the plan again with zarn mosaic plan");
+  };
   for (const ScenePlan& scene : plan.scenes) {
     for (const FileState& file : scene.files) {
       const FileState now = FileState::Of(file.name);
       if (now == file) continue;
-      const bool gone = now.bytes == 0 && now.modified == 0;
-      throw RunError(file.name + (gone ? " is gone" : " has changed") +
-                     " since the plan was made; make the plan again with zarn mosaic plan");
+      refuse(file.name, now.bytes == 0 && now.modified == 0 ? " is gone" : " has changed");
+    }
+    // A mask that has appeared beside it changes a scene, too.
+    for (const FileState& file : FilesOf(RasterSource(scene.File()))) {
+      const bool known =
+          std::find(scene.files.begin(), scene.files.end(), file) != scene.files.end();
+      if (!known) refuse(file.name, " has appeared");
     }
   }
 }

@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "apps/zarn/dataset.h"
 #include "apps/zarn/estimate/ground.h"
 #include "apps/zarn/mosaic/polygon.h"
 #include "apps/zarn/outputgrid.h"
@@ -93,6 +94,15 @@ MosaicPlan ReadPlan(const std::string& name);
 
 /// A number that tells plans apart: equal plans have equal ones.
 std::string Fingerprint(const MosaicPlan& plan);
+
+/// A file's absolute name; other names that GDAL opens stay as they are.
+std::string AbsoluteFile(const std::string& name);
+
+/// The file of a raster and those that belong to it.
+std::vector<FileState> FilesOf(const RasterSource& source);
+
+/// Whether the output is to be a VRT, which joins tiles that stay files of their own.
+bool IsVrt(const OutputOptions& output);
 
 /// Throws `RunError`, naming the first of them, when files of the scenes are not as they were when
 /// the plan was made.

@@ -20,6 +20,7 @@
 #include "apps/zarn/mosaic/seampolygons.h"
 #include "apps/zarn/mosaic/seams.h"
 #include "apps/zarn/nodata.h"
+#include "apps/zarn/outputformat.h"
 #include "apps/zarn/progress.h"
 #include "apps/zarn/sourcelocator.h"
 #include "apps/zarn/windowgeometry.h"
@@ -38,22 +39,6 @@ constexpr std::int64_t kGapReach = 16;
 BalanceKind KindOf(const std::string& name) {
   if (name == "gain-offset") return BalanceKind::kGainOffset;
   return name == "dodging" ? BalanceKind::kDodging : BalanceKind::kNone;
-}
-
-std::string AbsoluteName(const std::string& name) {
-  std::error_code error;
-  return fs::exists(name, error) ? fs::absolute(name, error).string() : name;
-}
-
-std::vector<FileState> FilesOf(const RasterSource& source) {
-  const std::string name = AbsoluteName(source.Name());
-  std::vector<FileState> files{FileState::Of(name)};
-  const CPLStringList parts(source.Dataset().GetFileList());
-  for (int i = 0; i < parts.size(); ++i) {
-    const std::string part = AbsoluteName(parts[i]);
-    if (part != name) files.push_back(FileState::Of(part));
-  }
-  return files;
 }
 
 Window Clipped(const Window& window, const OutputGrid& grid) {
@@ -102,7 +87,8 @@ class Planner {
     RequireNeighbours();
     Order();
     if (!options_.cutlines.empty()) {
-      AssignCutlines(options_.cutlines, options_.cutlineId, *mosaic_, plan_.scenes);
+      AssignCutlines(options_.cutlines, options_.cutlineId, *mosaic_, !options_.extent.empty(),
+                     plan_.scenes);
     }
     RefuseOutputs();
     Step("hot spots", 0, 0.4, [&](nspio::Counter& span) { RemoveHotSpots(span); });
@@ -139,6 +125,7 @@ class Planner {
   void PlaceScenes();
   void RequireNeighbours() const;
   void Order();
+  std::vector<std::string> Inputs() const;
   void RefuseOutputs() const;
   void RemoveHotSpots(nspio::Counter& progress);
   void TakeSurveys(nspio::Counter& progress);
@@ -354,28 +341,48 @@ void Planner::Order() {
   });
 }
 
+// All that is read, as it was named.
+std::vector<std::string> Planner::Inputs() const {
+  std::vector<std::string> inputs{options_.reference, options_.cutlines, options_.config};
+  for (const ScenePlan& scene : plan_.scenes) {
+    for (const FileState& file : scene.files) inputs.push_back(file.name);
+  }
+  std::erase(inputs, "");
+  return inputs;
+}
+
 // Before anything long begins.
 void Planner::RefuseOutputs() const {
   std::vector<std::string> targets{options_.output.target, options_.sourceMap,
-                                   options_.writeCutlines};
+                                   options_.writeCutlines, options_.plan};
   if (!options_.report.empty()) targets.push_back(ReportFile(options_.report).string());
   std::erase(targets, "");
+  std::set<fs::path> places;
+  const std::vector<std::string> inputs = Inputs();
   for (const std::string& target : targets) {
     std::error_code error;
-    if (std::count(targets.begin(), targets.end(), target) > 1) {
+    const fs::path place = fs::weakly_canonical(target, error);
+    if (!places.insert(place).second) {
       throw UsageError("two outputs have the name " + target + "; give each one of its own");
+    }
+    for (const std::string& input : inputs) {
+      if (!fs::equivalent(input, target, error)) continue;
+      throw UsageError("the output " + target + " is the input " + input + "; name another output");
     }
     if (!options_.output.overwrite && fs::exists(fs::symlink_status(target, error))) {
       throw RunError(target + " exists; name another output or add --overwrite");
     }
-    for (const ScenePlan& scene : plan_.scenes) {
-      for (const FileState& file : scene.files) {
-        if (!fs::equivalent(file.name, target, error)) continue;
-        throw UsageError("the output " + target + " is a file of the scene " + scene.File() +
-                         "; name another output");
-      }
+    const bool inReport =
+        !options_.report.empty() && target == ReportFile(options_.report).string();
+    if (!inReport && !fs::is_directory(place.parent_path(), error)) {
+      throw RunError("cannot write " + target + ": there is no folder " +
+                     place.parent_path().string() + "; create it first");
     }
   }
+  // A VRT joins tiles, and is written without a format of its own.
+  if (IsVrt(options_.output)) return;
+  OutputFormat(options_.output.format, options_.output.target, options_.output.creation)
+      .RequireSamples(first_->Type());
 }
 
 void Planner::RemoveHotSpots(nspio::Counter& progress) {
@@ -407,12 +414,16 @@ void Planner::BalanceScenes() {
   Survey& survey = *planning_.survey;
   std::size_t anchor = 0;
   bool isScene = options_.reference.empty();
-  const std::string reference = AbsoluteName(options_.reference);
+  const std::string reference = AbsoluteFile(options_.reference);
+  const auto same = [](const std::string& a, const std::string& b) {
+    std::error_code error;
+    return a == b || fs::equivalent(a, b, error);
+  };
   for (std::size_t i = 0; i < plan_.scenes.size(); ++i) {
     const std::string& file = plan_.scenes[i].File();
     // The first one listed, wherever it is pasted.
-    const bool chosen = options_.reference.empty() ? file == AbsoluteName(options_.scenes.front())
-                                                   : file == reference;
+    const bool chosen = options_.reference.empty() ? file == AbsoluteFile(options_.scenes.front())
+                                                   : same(file, reference);
     if (!chosen) continue;
     anchor = i;
     isScene = true;
@@ -486,7 +497,9 @@ void Planner::SettleReach() {
     const Window around{held(std::floor(left)) - margin, held(std::floor(top)) - margin,
                         held(std::ceil(right)) - held(std::floor(left)) + 2 * margin,
                         held(std::ceil(bottom)) - held(std::floor(top)) + 2 * margin};
-    scene.reach = Intersection(around, scene.covers);
+    // Where a scene must have data it is looked at even beyond its own.
+    scene.reach =
+        plan_.stopsOnNoData ? Clipped(around, plan_.grid) : Intersection(around, scene.covers);
     if (IsEmpty(scene.reach)) scene.reach = {};
   }
 }

@@ -44,6 +44,8 @@ struct MosaicOptions {
   bool stopOnNoData = false;
   std::int64_t tileSide = 1024;
   std::string report;
+  std::string config;  ///< file that options were read from, or empty
+  std::string plan;    ///< file that the plan is written to, or empty
 };
 
 /// A plan, and what it rests on.

@@ -122,7 +122,8 @@ void RunTiles(const MosaicPlan& plan, const RasterSource& like, const std::vecto
     if (job.first) composer.Begin(tiles[job.tile].window, tile);
     if (slot.feed) {
       slot.feed->Fill(slot.pixels);
-      if (slot.pixels.drawsOnSource) composer.Paste(job.scene, slot.pixels, tile);
+      if (slot.pixels.drawsOnSource || plan.stopsOnNoData)
+        composer.Paste(job.scene, slot.pixels, tile);
     }
     if (job.last) composer.Finish(tile);
   };

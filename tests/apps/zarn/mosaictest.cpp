@@ -243,6 +243,9 @@ TEST_F(Mosaicking, DoesNotDependOnThreadsMemoryTilesOrPieces) {
       GDALDataset::Open((folder_ / "job.tiles/tile_000017.tif").c_str(), GDAL_OF_UPDATE));
   ASSERT_EQ(stale->SetMetadataItem("ZARN_PLAN", "other"), CE_None);
   stale->FlushCache(true);
+  // Neither does one that was cut off.
+  const std::string cut = folder_ / "job.tiles/tile_000005.tif";
+  fs::resize_file(cut, fs::file_size(cut) / 2);
   const auto before = fs::last_write_time(folder_ / "job.tiles/tile_000003.tif");
   Run({"mosaic", "run", plan});
   EXPECT_EQ(fs::last_write_time(folder_ / "job.tiles/tile_000003.tif"), before);
@@ -374,8 +377,14 @@ TEST_F(Mosaicking, RefusesWhatCannotWorkBeforeItBegins) {
        1,
        "inside of its cutline"},
       {{files_[0], files_[0]}, 1, "exists"},
-      {{files_[0], files_[0], "--overwrite"}, 2, "is a file of the scene"},
-      {{files_[0], out, "--source-map", out}, 2, "two outputs"},
+      {{files_[0], files_[0], "--overwrite"}, 2, "is the input"},
+      {{files_[0], out, "--source-map", folder_ / "./mosaic.tif"}, 2, "two outputs"},
+      {{files_[0], files_[1], "--overwrite", "--balance", "gain-offset", "--reference", files_[1]},
+       2,
+       "is the input"},
+      {{files_[0], out, "--of", "NOPE"}, 2, "NOPE"},
+      {{files_[0], folder_ / "none/x.tif"}, 1, "there is no folder"},
+      {{files_[0], files_[1], out, "plan", "-o", folder_ / "p.json"}, 2, "has to come after"},
       {{out}, 2, "give at least one scene"},
       {{files_[0], folder_ / "x.vrt"}, 2, "VRT"},
       {{files_[0], out, "--te", "0", "0", "10", "10"}, 1, "no scene lies within --te"},
