@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/mosaic/mosaicjob.h"
 
+#include <cpl_error.h>
 #include <gdal_utils.h>
 
 #include <algorithm>
@@ -62,6 +63,7 @@ class TileFolder {
   bool IsWhole(const std::string& file) const {
     std::error_code error;
     if (!fs::exists(file, error)) return false;
+    const CPLErrorHandlerPusher quiet(CPLQuietErrorHandler);
     const DatasetPtr dataset(GDALDataset::Open(file.c_str(), GDAL_OF_RASTER | GDAL_OF_READONLY));
     if (!dataset) return false;
     const char* const made = dataset->GetMetadataItem(kPlanItem);

@@ -376,7 +376,7 @@ TEST_F(Mosaicking, RefusesWhatCannotWorkBeforeItBegins) {
       {{files_[0], files_[1], out, "--cutlines", cutlines, "--stop-on-nodata"},
        1,
        "inside of its cutline"},
-      {{files_[0], files_[0]}, 1, "exists"},
+      {{files_[0], cutlines}, 1, "exists"},
       {{files_[0], files_[0], "--overwrite"}, 2, "is the input"},
       {{files_[0], out, "--source-map", folder_ / "./mosaic.tif"}, 2, "two outputs"},
       {{files_[0], files_[1], "--overwrite", "--balance", "gain-offset", "--reference", files_[1]},
