@@ -184,7 +184,9 @@ void MakeMosaic(const MosaicOptions& options) {
     if (report) report->Take(part, tile);
     file.Write(tile, 0, 0);
   };
-  const auto run = [&] { RunTiles(plan, like, plan.Tiles(), options.work, take, running); };
+  const auto run = [&] {
+    RunTiles(plan, like, plan.Tiles(), options.work, SinkKind::kConcurrent, take, running);
+  };
   planning.seconds.emplace_back("tiles", Seconds(run));
   ProgressSpan publishing(progress, pasted, end);
   planning.seconds.emplace_back("publishing", Seconds([&] { file.Publish(publishing); }));
@@ -253,7 +255,7 @@ void RunPlan(const std::string& file, const TileRange& range, const WorkOptions&
   const RasterSource like = FirstScene(plan);
   std::size_t next = 0;
   RunTiles(
-      plan, like, missing, work,
+      plan, like, missing, work, SinkKind::kAlone,
       [&](const TilePlan& tile, TileBuffers& buffers) {
         const std::size_t number = numbers[next++];
         const OutputOptions output{

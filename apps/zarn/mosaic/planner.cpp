@@ -361,7 +361,7 @@ void Planner::RefuseOutputs() const {
   const std::vector<std::string> inputs = Inputs();
   for (const std::string& target : targets) {
     std::error_code error;
-    const fs::path place = fs::weakly_canonical(target, error);
+    const fs::path place = fs::weakly_canonical(fs::absolute(target, error), error);
     if (!places.insert(place).second) {
       throw UsageError("two outputs have the name " + target + "; give each one of its own");
     }

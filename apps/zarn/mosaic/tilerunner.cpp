@@ -97,7 +97,8 @@ std::int64_t MostSourcePixels(std::size_t pixelBytes, const WorkOptions& work) {
 }
 
 void RunTiles(const MosaicPlan& plan, const RasterSource& like, const std::vector<TilePlan>& tiles,
-              const WorkOptions& work, const TileSink& sink, nspio::Counter& progress) {
+              const WorkOptions& work, SinkKind kind, const TileSink& sink,
+              nspio::Counter& progress) {
   if (CPLGetConfigOption("GDAL_CACHEMAX", nullptr) == nullptr) GDALSetCacheMax64(kBlockCache);
   const std::vector<Job> jobs = JobsOf(plan, tiles);
   const std::size_t bands = like.Channels().size() + like.Alphas().size();
@@ -134,7 +135,7 @@ void RunTiles(const MosaicPlan& plan, const RasterSource& like, const std::vecto
   };
   const int count = work.threads > 0 ? work.threads : sys::OMPGetMaxThreads();
   const sys::OMPThreadCount threads(count);
-  if (count == 1) {
+  if (count == 1 || kind == SinkKind::kAlone) {
     RunOnOneThread(jobs.size(), kStreamSlots, {read, paste, write});
   } else {
     RunPipeline(jobs.size(), kStreamSlots, {read, paste, write}, 1);
