@@ -136,6 +136,7 @@ class Network {
     }
     constexpr double kFirm = 1e12;
     std::vector<Correction> corrections;
+    corrections.reserve(before.size());
     for (const ScenePlan& plan : before) corrections.emplace_back(plan);
     for (int round = 0; round < kRounds; ++round) {
       std::vector<std::vector<double>> targets = Targets(

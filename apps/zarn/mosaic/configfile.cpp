@@ -57,6 +57,14 @@ void Set(CLI::Option& option, const json& value, const std::string& place) {
   }
 }
 
+[[noreturn]] void RefuseUnknown(const std::string& file, const std::string& key) {
+  throw UsageError(file + ": there is no option '" + key + "' (see zarn mosaic --help)");
+}
+
+std::string PlaceOf(const std::string& file, const std::string& key) {
+  return file + ": '" + key + "'";
+}
+
 }  // namespace
 
 void ApplyConfig(const std::string& file, CLI::App& command) {
@@ -72,9 +80,9 @@ void ApplyConfig(const std::string& file, CLI::App& command) {
   for (const auto& [key, value] : config.items()) {
     CLI::Option* const option = Find(command, key);
     if (option == nullptr || key == "config" || key == "help") {
-      throw UsageError(file + ": there is no option '" + key + "' (see zarn mosaic --help)");
+      RefuseUnknown(file, key);
     }
-    if (option->count() == 0) Set(*option, value, file + ": '" + key + "'");
+    if (option->count() == 0) Set(*option, value, PlaceOf(file, key));
   }
 }
 

@@ -60,6 +60,18 @@ Polygon PolygonOf(const processes::filters::PolygonParam& param) {
   return polygon;
 }
 
+[[noreturn]] void RefuseShared(const std::string& file, const std::string& name,
+                               const std::string& one, const std::string& other) {
+  throw RunError("the cutline '" + name + "' in " + file + " may be that of " + one + " or of " +
+                 other + "; name them by their paths");
+}
+
+[[noreturn]] void RefuseMissing(const std::string& file, const std::string& key,
+                                const ScenePlan& scene) {
+  throw RunError(file + " has no cutline for " + scene.File() + ": none whose " + key + " is '" +
+                 scene.label + "'; add one, or leave the scene out");
+}
+
 }  // namespace
 
 void AssignCutlines(const std::string& file, const std::string& field, const RasterSource& mosaic,
@@ -74,15 +86,13 @@ void AssignCutlines(const std::string& file, const std::string& field, const Ras
       if (!values.contains(name)) continue;
       const auto [other, fresh] = owners.emplace(name, scene.File());
       if (!fresh) {
-        throw RunError("the cutline '" + name + "' in " + file + " may be that of " +
-                       other->second + " or of " + scene.File() + "; name them by their paths");
+        RefuseShared(file, name, other->second, scene.File());
       }
       where = Quoted(key, '"') + " = " + Quoted(name, '\'');
       break;
     }
     if (where.empty()) {
-      throw RunError(file + " has no cutline for " + scene.File() + ": none whose " + key +
-                     " is '" + scene.label + "'; add one, or leave the scene out");
+      RefuseMissing(file, key, scene);
     }
     const RasterPolygon polygon = LoadCutline({.file = file, .layer = {}, .where = where}, mosaic);
     if (!partial &&

@@ -160,7 +160,7 @@ void AddWork(Declarer& declare, CLI::App& command, WorkOptions& work) {
 }
 
 std::shared_ptr<ParsedOptions> AddMosaicOptions(CLI::App& command) {
-  const auto parsed = std::make_shared<ParsedOptions>();
+  auto parsed = std::make_shared<ParsedOptions>();
   Declarer declare(command);
   MosaicOptions& options = parsed->mosaic;
   declare.Add("SCENES", parsed->files, "",

@@ -74,6 +74,15 @@ std::optional<OutputGrid> OwnGrid(const RasterSource& source, const OGRSpatialRe
   return grid;
 }
 
+[[noreturn]] void RefuseInput(const std::string& target, const std::string& input) {
+  throw UsageError("the output " + target + " is the input " + input + "; name another output");
+}
+
+[[noreturn]] void RefuseFolder(const std::string& target, const fs::path& folder) {
+  throw RunError("cannot write " + target + ": there is no folder " + folder.string() +
+                 "; create it first");
+}
+
 class Planner {
  public:
   Planner(const MosaicOptions& options, nspio::Counter& progress)
@@ -367,7 +376,7 @@ void Planner::RefuseOutputs() const {
     }
     for (const std::string& input : inputs) {
       if (!fs::equivalent(input, target, error)) continue;
-      throw UsageError("the output " + target + " is the input " + input + "; name another output");
+      RefuseInput(target, input);
     }
     if (!options_.output.overwrite && fs::exists(fs::symlink_status(target, error))) {
       throw RunError(target + " exists; name another output or add --overwrite");
@@ -375,8 +384,7 @@ void Planner::RefuseOutputs() const {
     const bool inReport =
         !options_.report.empty() && target == ReportFile(options_.report).string();
     if (!inReport && !fs::is_directory(place.parent_path(), error)) {
-      throw RunError("cannot write " + target + ": there is no folder " +
-                     place.parent_path().string() + "; create it first");
+      RefuseFolder(target, place.parent_path());
     }
   }
   // A VRT joins tiles, and is written without a format of its own.
