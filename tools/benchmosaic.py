@@ -152,7 +152,7 @@ def main():
     os.remove(out)
 
     job = os.path.join(folder, "job.json")
-    tiles = os.path.join(folder, "job.tiles")
+    tiles = os.path.join(folder, "job.json.tiles")
     plan = ["zarn", "mosaic", "plan", "-q", "--overwrite", "--feather", str(FEATHER), "-o", job]
     seconds, peak = timed(plan + cut + ["--balance", "gain-offset"] + scenes + [out])
     report("plan", seconds, peak)

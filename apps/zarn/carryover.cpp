@@ -112,8 +112,8 @@ bool NeedsMask(const RasterSource& source, const std::vector<double>& noData) {
   return !source.Masks().empty() || (noData.empty() && source.Alphas().empty());
 }
 
-void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output,
-               const OutputGrid* grid, bool masked) {
+void Describe(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output,
+              const OutputGrid* grid) {
   for (int number = 1; number <= output.GetRasterCount(); ++number) {
     CopyBand(*source.Dataset().GetRasterBand(number), *output.GetRasterBand(number));
   }
@@ -124,6 +124,11 @@ void CarryOver(const RasterSource& source, const std::vector<double>& noData, GD
     Place(*grid, output);
   }
   DeclareNoData(source, noData, output);
+}
+
+void CarryOver(const RasterSource& source, const std::vector<double>& noData, GDALDataset& output,
+               const OutputGrid* grid, bool masked) {
+  Describe(source, noData, output, grid);
   if (masked || !source.Masks().empty()) output.CreateMaskBand(GMF_PER_DATASET);
 }
 

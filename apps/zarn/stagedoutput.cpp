@@ -17,11 +17,12 @@ namespace zarn::app {
 namespace fs = std::filesystem;
 namespace {
 
-std::string TargetBesideInputs(const std::string& target) {
-  std::vector<fs::path> files = SideFiles(target);
-  files.emplace_back(target);
-  RefuseReplacingInputs(target, files);
-  return target;
+std::string TargetBesideInputs(const OutputOptions& options) {
+  if (options.apartFromInputs) return options.target;
+  std::vector<fs::path> files = SideFiles(options.target);
+  files.emplace_back(options.target);
+  RefuseReplacingInputs(options.target, files);
+  return options.target;
 }
 
 int CPL_STDCALL UpdateCounter(double fraction, const char*, void* counter) {
@@ -92,7 +93,8 @@ void CloseChecked(DatasetPtr dataset, const std::string& name) {
 
 StagedOutput::StagedOutput(const OutputOptions& options, const RasterSource& like,
                            const std::vector<double>& noData, const OutputGrid* grid, bool masked)
-    : format_(options.format, TargetBesideInputs(options.target), options.creation),
+    : apartFromInputs_(options.apartFromInputs),
+      format_(options.format, TargetBesideInputs(options), options.creation),
       staging_(options.target, options.overwrite) {
   RenameInMessages(staging_.StagedFile().string(), Name());
   RenameInMessages(staging_.Scratch().string(), Name());
@@ -118,7 +120,7 @@ void StagedOutput::Create(const RasterSource& like, const OutputGrid* grid) {
 void StagedOutput::Publish(nspio::Counter& progress) {
   CloseChecked(std::move(dataset_), Name());
   if (!format_.WritesBlocks()) CopyToFormat(progress);
-  RefuseReplacingInputs(staging_.Target(), staging_.FilesToPublish());
+  if (!apartFromInputs_) RefuseReplacingInputs(staging_.Target(), staging_.FilesToPublish());
   staging_.Publish();
   progress.Update(1);
 }

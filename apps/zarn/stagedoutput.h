@@ -20,6 +20,9 @@ struct OutputOptions {
   std::string format;                 ///< a GDAL driver name; empty: by the target's extension
   std::vector<std::string> creation;  ///< KEY=VALUE
   bool overwrite = false;
+  /// That no file of an input is replaced is known. Otherwise all rasters that are open are looked
+  /// at, which no other thread may open or close meanwhile.
+  bool apartFromInputs = false;
 };
 
 /// An output raster with the bands of a source and its size, or on a grid of its own. It is written
@@ -48,6 +51,7 @@ class StagedOutput {
   void Create(const RasterSource& like, const OutputGrid* grid);
   void CopyToFormat(nspio::Counter& progress);
 
+  bool apartFromInputs_;
   OutputFormat format_;
   StagingFolder staging_;
   CPLStringList options_;

@@ -5,6 +5,8 @@
 #include <exception>
 #include <fstream>
 #include <nlohmann/json.hpp>
+#include <set>
+#include <string>
 #include <vector>
 
 #include "apps/zarn/errors.h"
@@ -71,11 +73,21 @@ void ApplyConfig(const std::string& file, CLI::App& command) {
   std::ifstream stream(file, std::ios::binary);
   if (!stream) throw UsageError("cannot read the configuration " + file);
   json config;
+  std::set<std::string> keys;
+  std::string repeated;
+  const auto look = [&](int depth, json::parse_event_t event, const json& parsed) {
+    if (event == json::parse_event_t::key && depth == 1 &&
+        !keys.insert(parsed.get<std::string>()).second) {
+      repeated = parsed.get<std::string>();
+    }
+    return true;
+  };
   try {
-    config = json::parse(stream);
+    config = json::parse(stream, look);
   } catch (const std::exception& error) {
     throw UsageError(file + " is not JSON: " + error.what());
   }
+  if (!repeated.empty()) throw UsageError(PlaceOf(file, repeated) + " is there twice");
   if (!config.is_object()) throw UsageError(file + ": expected an object of options");
   for (const auto& [key, value] : config.items()) {
     CLI::Option* const option = Find(command, key);

@@ -172,14 +172,27 @@ std::shared_ptr<ParsedOptions> AddMosaicOptions(CLI::App& command) {
   declare.Add(
       "--config", parsed->config, "FILE",
       "JSON object with any of these options by their long names (\"scenes\" for SCENES and OUT); "
-      "the command line counts more");
+      "the command line counts more, and a single file on it is another OUT");
   AddWork(declare, command, options.work);
   return parsed;
 }
 
+// A single file on the command line is another output for the scenes of the configuration.
+void Configure(ParsedOptions& parsed, CLI::App& command) {
+  std::vector<std::string> output;
+  if (parsed.files.size() == 1) {
+    output.swap(parsed.files);
+    command.get_option("SCENES")->clear();
+  }
+  ApplyConfig(parsed.config, command);
+  if (output.empty()) return;
+  if (!parsed.files.empty()) parsed.files.pop_back();
+  parsed.files.push_back(output.front());
+}
+
 // What can be settled only once all options are known.
 const MosaicOptions& Settle(ParsedOptions& parsed, CLI::App& command) {
-  if (!parsed.config.empty()) ApplyConfig(parsed.config, command);
+  if (!parsed.config.empty()) Configure(parsed, command);
   if (parsed.files.size() < 2) {
     throw UsageError("give at least one scene and then the output (see zarn mosaic --help)");
   }

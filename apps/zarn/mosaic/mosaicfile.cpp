@@ -43,21 +43,26 @@ RasterSource GridRaster(const std::string& name, const OutputGrid& grid, const S
   return RasterSource(name, std::move(dataset));
 }
 
+void NameScenes(const MosaicPlan& plan, GDALDataset& map) {
+  for (std::size_t i = 0; i < plan.scenes.size(); ++i) {
+    map.SetMetadataItem(("SCENE_" + std::to_string(i + 1)).c_str(), plan.scenes[i].label.c_str());
+  }
+}
+
 MosaicFile::MosaicFile(const MosaicPlan& plan, const RasterSource& like, const OutputGrid& grid,
                        const OutputOptions& image, const std::string& map)
     : image_(image, like, plan.noData, &grid, NeedsMask(like, plan.noData)),
       writer_(like, image_.Dataset(), image_.Name()) {
   if (map.empty()) return;
-  const OutputOptions options{
-      .target = map, .format = {}, .creation = {}, .overwrite = image.overwrite};
+  const OutputOptions options{.target = map,
+                              .format = {},
+                              .creation = {},
+                              .overwrite = image.overwrite,
+                              .apartFromInputs = image.apartFromInputs};
   const RasterSource numbers =
       GridRaster(map, grid, SourceMapType(static_cast<std::int64_t>(plan.scenes.size())));
   map_.emplace(options, numbers, std::vector<double>{0}, &grid);
-  // Whoever looks at the map wants to know which scenes the numbers stand for.
-  for (std::size_t i = 0; i < plan.scenes.size(); ++i) {
-    map_->Dataset().SetMetadataItem(("SCENE_" + std::to_string(i + 1)).c_str(),
-                                    plan.scenes[i].label.c_str());
-  }
+  NameScenes(plan, map_->Dataset());
 }
 
 void MosaicFile::Write(TileBuffers& tile, std::int64_t left, std::int64_t top) {

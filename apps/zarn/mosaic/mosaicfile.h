@@ -17,12 +17,15 @@ namespace zarn::app {
 /// raster.
 RasterSource GridRaster(const std::string& name, const OutputGrid& grid, const SampleType& type);
 
+/// Notes in a map of scenes which of them its numbers stand for.
+void NameScenes(const MosaicPlan& plan, GDALDataset& map);
+
 /// The files that a mosaic, or a tile of one, is written to: the image and the map of scenes. They
 /// appear, whole, with `Publish`.
 class MosaicFile {
  public:
-  /// `like` is the first scene of the plan. `grid` may be a part of the plan's, `map` empty. Throws
-  /// as `StagedOutput` does.
+  /// `like` is the leading scene of the plan. `grid` may be a part of the plan's, `map` empty.
+  /// Throws as `StagedOutput` does.
   MosaicFile(const MosaicPlan& plan, const RasterSource& like, const OutputGrid& grid,
              const OutputOptions& image, const std::string& map);
 

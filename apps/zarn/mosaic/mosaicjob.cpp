@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/mosaic/mosaicjob.h"
 
+#include <cpl_conv.h>
 #include <cpl_error.h>
+#include <cpl_minixml.h>
 #include <gdal_utils.h>
 
 #include <algorithm>
@@ -13,6 +15,7 @@
 #include <system_error>
 #include <vector>
 
+#include "apps/zarn/carryover.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/estimate/stagedjson.h"
 #include "apps/zarn/gdalruntime.h"
@@ -34,19 +37,25 @@ void SetUp(const WorkOptions& work) {
   SetGdalThreads(work.threads);
 }
 
-RasterSource FirstScene(const MosaicPlan& plan) { return RasterSource(plan.scenes.front().File()); }
+RasterSource LeadingScene(const MosaicPlan& plan) { return RasterSource(plan.Leading().File()); }
 
 /// Where the tiles of a plan are.
 class TileFolder {
  public:
   TileFolder(const std::string& plan, std::string fingerprint)
-      : folder_(fs::absolute(plan).replace_extension(".tiles")),
-        fingerprint_(std::move(fingerprint)) {}
+      : folder_(fs::absolute(plan) += ".tiles"), fingerprint_(std::move(fingerprint)) {}
 
   void Create() const {
     std::error_code error;
     fs::create_directories(folder_, error);
     if (error) throw RunError("cannot create " + folder_.string() + ": " + error.message());
+  }
+
+  /// Throws `UsageError` when a file of a scene lies where the tiles go.
+  void RequireApart(const MosaicPlan& plan) const {
+    for (const ScenePlan& scene : plan.scenes) {
+      for (const FileState& file : scene.files) RequireApart(file.name);
+    }
   }
 
   std::string Image(std::size_t tile) const { return Name(tile, ".tif"); }
@@ -78,6 +87,14 @@ class TileFolder {
       }
     }
     return true;
+  }
+
+  void RequireApart(const std::string& file) const {
+    std::error_code error;
+    if (!fs::equivalent(fs::path(file).parent_path(), folder_, error)) return;
+    throw UsageError(
+        file + " lies in " + folder_.string() +
+        ", the folder for the plan's tiles; move it elsewhere and make the plan again");
   }
 
   std::string Name(std::size_t tile, const char* extension) const {
@@ -127,8 +144,40 @@ void RequireTiles(const TileFolder& folder, std::size_t count, bool withMap,
                  std::to_string(missing.front()) + "; make them with zarn mosaic run " + plan);
 }
 
-// Writes the text of a VRT that refers to its tiles from where it is going to lie.
-void WriteVrt(const std::string& target, bool overwrite, const std::vector<std::string>& tiles) {
+void TakeWhole(CPLXMLNode& source) {
+  CPLFree(source.pszValue);
+  source.pszValue = CPLStrdup("SimpleSource");
+  for (const char* const condition : {"UseMaskBand", "NODATA"}) {
+    CPLXMLNode* const node = CPLGetXMLNode(&source, condition);
+    if (node == nullptr) continue;
+    CPLRemoveXMLChild(&source, node);
+    CPLDestroyXMLNode(node);
+  }
+}
+
+// The text of a VRT whose sources give all of their pixels. Tiles share none, so nothing shows
+// through where one has no data: what it holds there is what the mosaic holds.
+std::string WithWholeSources(const char* vrt) {
+  const std::unique_ptr<CPLXMLNode, decltype(&CPLDestroyXMLNode)> root(CPLParseXMLString(vrt),
+                                                                       CPLDestroyXMLNode);
+  if (!root) return {};
+  std::vector<CPLXMLNode*> open{root.get()};
+  while (!open.empty()) {
+    CPLXMLNode* const node = open.back();
+    open.pop_back();
+    if (node->eType == CXT_Element && EQUAL(node->pszValue, "ComplexSource")) TakeWhole(*node);
+    if (node->psNext != nullptr) open.push_back(node->psNext);
+    if (node->psChild != nullptr) open.push_back(node->psChild);
+  }
+  const std::unique_ptr<char, decltype(&VSIFree)> text(CPLSerializeXMLTree(root.get()), VSIFree);
+  return text ? text.get() : "";
+}
+
+// Writes the text of a VRT that refers to its tiles from where it is going to lie, after `describe`
+// has seen to what the tiles' own description does not say of the whole.
+template <typename Describe>
+void WriteVrt(const std::string& target, bool overwrite, const std::vector<std::string>& tiles,
+              const Describe& describe) {
   StagingFolder staging(target, overwrite);
   std::vector<const char*> names;
   names.reserve(tiles.size());
@@ -141,11 +190,13 @@ void WriteVrt(const std::string& target, bool overwrite, const std::vector<std::
   if (!vrt || failed != FALSE) {
     throw RunError("cannot join the tiles as " + target + ": " + LastGdalMessage());
   }
+  describe(*vrt);
   char** const xml = vrt->GetMetadata("xml:VRT");
+  const std::string text = xml != nullptr ? WithWholeSources(xml[0]) : "";
   std::ofstream file(staging.StagedFile(), std::ios::binary);
-  file << (xml != nullptr ? xml[0] : "");
+  file << text;
   file.close();
-  if (!file || xml == nullptr) FailWriting(target, "");
+  if (!file || text.empty()) FailWriting(target, "");
   // The data set must not write itself at the end.
   vrt->SetDescription("");
   staging.Publish();
@@ -159,8 +210,12 @@ void JoinAsVrt(const MosaicPlan& plan, const TileFolder& folder, std::size_t cou
     images.push_back(folder.Image(i));
     maps.push_back(folder.Map(i));
   }
-  if (!plan.sourceMap.empty()) WriteVrt(plan.sourceMap, overwrite, maps);
-  WriteVrt(plan.output.target, overwrite, images);
+  if (!plan.sourceMap.empty()) {
+    WriteVrt(plan.sourceMap, overwrite, maps, [&](GDALDataset& map) { NameScenes(plan, map); });
+  }
+  const RasterSource like = LeadingScene(plan);
+  WriteVrt(plan.output.target, overwrite, images,
+           [&](GDALDataset& image) { Describe(like, plan.noData, image, &plan.grid); });
 }
 
 }  // namespace
@@ -175,7 +230,7 @@ void MakeMosaic(const MosaicOptions& options) {
   Planning planning = MakePlan(options, planningSpan);
   const MosaicPlan& plan = planning.plan;
   if (report) report->Begin(plan);
-  const RasterSource like = FirstScene(plan);
+  const RasterSource like = LeadingScene(plan);
   MosaicFile file(plan, like, plan.grid, plan.output, plan.sourceMap);
   const double end = report ? 0.97 : 1;
   const double pasted = file.CopiesAtTheEnd() ? 0.7 : end - 0.01;
@@ -184,9 +239,7 @@ void MakeMosaic(const MosaicOptions& options) {
     if (report) report->Take(part, tile);
     file.Write(tile, 0, 0);
   };
-  const auto run = [&] {
-    RunTiles(plan, like, plan.Tiles(), options.work, SinkKind::kConcurrent, take, running);
-  };
+  const auto run = [&] { RunTiles(plan, like, plan.Tiles(), options.work, take, running); };
   planning.seconds.emplace_back("tiles", Seconds(run));
   ProgressSpan publishing(progress, pasted, end);
   planning.seconds.emplace_back("publishing", Seconds([&] { file.Publish(publishing); }));
@@ -239,6 +292,7 @@ void RunPlan(const std::string& file, const TileRange& range, const WorkOptions&
   }
   RequireUnchanged(plan);
   const TileFolder folder(file, Fingerprint(plan));
+  folder.RequireApart(plan);
   folder.Create();
   std::vector<TilePlan> missing;
   std::vector<std::size_t> numbers;
@@ -252,14 +306,17 @@ void RunPlan(const std::string& file, const TileRange& range, const WorkOptions&
     progress.Update(1);
     return;
   }
-  const RasterSource like = FirstScene(plan);
+  const RasterSource like = LeadingScene(plan);
   std::size_t next = 0;
   RunTiles(
-      plan, like, missing, work, SinkKind::kAlone,
+      plan, like, missing, work,
       [&](const TilePlan& tile, TileBuffers& buffers) {
         const std::size_t number = numbers[next++];
-        const OutputOptions output{
-            .target = folder.Image(number), .format = "GTiff", .creation = {}, .overwrite = true};
+        const OutputOptions output{.target = folder.Image(number),
+                                   .format = "GTiff",
+                                   .creation = {},
+                                   .overwrite = true,
+                                   .apartFromInputs = true};
         MosaicFile result(plan, like, PartOf(plan.grid, tile.window), output,
                           plan.sourceMap.empty() ? "" : folder.Map(number));
         result.Annotate(kPlanItem, folder.Fingerprint());
@@ -284,7 +341,7 @@ void FinishPlan(const std::string& file, const FinishOptions& options, const Wor
     JoinAsVrt(plan, folder, tiles.size(), plan.output.overwrite);
     return;
   }
-  const RasterSource like = FirstScene(plan);
+  const RasterSource like = LeadingScene(plan);
   MosaicFile result(plan, like, plan.grid, plan.output, plan.sourceMap);
   TerminalProgress progress(work.quiet);
   ProgressSpan joining(progress, 0, result.CopiesAtTheEnd() ? 0.5 : 0.99);

@@ -163,6 +163,7 @@ void Require(bool sound, const std::string& what) {
 // What would read beyond an array, or not at all, if somebody had edited the plan.
 void RequireSound(const MosaicPlan& plan) {
   Require(!plan.scenes.empty(), "it has no scenes");
+  Require(plan.leading < plan.scenes.size(), "leading is no scene");
   Require(plan.grid.width > 0 && plan.grid.height > 0, "its grid has no pixels");
   Require(plan.tileSide >= 16 && plan.tileSide % 16 == 0, "tileSide is not a multiple of 16");
   Require(
@@ -209,6 +210,7 @@ MosaicPlan PlanOf(const Json& json) {
   plan.stopsOnNoData = json.at("stopsOnNoData").get<bool>();
   plan.tileSide = json.at("tileSide").get<std::int64_t>();
   for (const Json& scene : json.at("scenes")) plan.scenes.push_back(SceneOf(scene));
+  plan.leading = json.at("leading").get<std::size_t>();
   RequireSound(plan);
   return plan;
 }
@@ -267,6 +269,7 @@ Json ToJson(const MosaicPlan& plan) {
           {"fillsGaps", plan.fillsGaps},
           {"stopsOnNoData", plan.stopsOnNoData},
           {"tileSide", plan.tileSide},
+          {"leading", plan.leading},
           {"scenes", scenes},
           {"tiles", tiles}};
 }
@@ -306,6 +309,13 @@ std::string Fingerprint(const MosaicPlan& plan) {
 
 std::string AbsoluteFile(const std::string& name) {
   std::error_code error;
+  for (const std::string archive : {"/vsizip/", "/vsitar/", "/vsigzip/"}) {
+    if (!name.starts_with(archive)) continue;
+    const std::string inside = name.substr(archive.size());
+    // Nested ones and names in braces stay as they are.
+    const bool isRelative = !inside.empty() && inside[0] != '/' && inside[0] != '{';
+    return isRelative ? archive + fs::absolute(inside, error).string() : name;
+  }
   return fs::exists(name, error) ? fs::absolute(name, error).string() : name;
 }
 

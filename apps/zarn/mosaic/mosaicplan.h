@@ -81,7 +81,10 @@ struct MosaicPlan {
   bool stopsOnNoData = false;
   std::int64_t tileSide = 1024;
   std::vector<ScenePlan> scenes;  ///< in the order of pasting
+  /// The scene listed first: the mosaic's bands are its bands and are described as these are.
+  std::size_t leading = 0;
 
+  const ScenePlan& Leading() const { return scenes[leading]; }
   /// Row by row.
   std::vector<TilePlan> Tiles() const;
 };

@@ -94,6 +94,9 @@ class Planner {
     LayGrid();
     PlaceScenes();
     RequireNeighbours();
+    if (!options_.writeCutlines.empty() && plan_.scenes.size() < 2) {
+      throw UsageError("--write-cutlines: a single scene has no seams");
+    }
     Order();
     if (!options_.cutlines.empty()) {
       AssignCutlines(options_.cutlines, options_.cutlineId, *mosaic_, !options_.extent.empty(),
@@ -134,6 +137,7 @@ class Planner {
   void PlaceScenes();
   void RequireNeighbours() const;
   void Order();
+  void SortByResolution(std::vector<ScenePlan>& scenes) const;
   std::vector<std::string> Inputs() const;
   void RefuseOutputs() const;
   void RemoveHotSpots(nspio::Counter& progress);
@@ -165,6 +169,12 @@ void Planner::CheckOptions() const {
   if (!options_.writeCutlines.empty() && !FindsSeams()) {
     throw UsageError(
         "--write-cutlines: there are no seams to write with --cutlines or --seams none");
+  }
+  if (options_.feather > 0 && options_.cutlines.empty() && !FindsSeams()) {
+    throw UsageError("--feather: with --seams none there are no cutlines to be softened");
+  }
+  if (options_.filterSize != MosaicOptions().filterSize && options_.filter == "none") {
+    throw UsageError("--filter-size needs --filter");
   }
   if (!options_.reference.empty() && options_.balance == "none" && !options_.hotSpot) {
     throw UsageError("--reference needs --balance or --hotspot, which bring scenes onto it");
@@ -333,9 +343,16 @@ void Planner::RequireNeighbours() const {
 }
 
 void Planner::Order() {
-  std::vector<ScenePlan>& scenes = plan_.scenes;
-  if (options_.order == "reverse") std::reverse(scenes.begin(), scenes.end());
-  if (options_.order != "resolution") return;
+  const std::string leading = plan_.scenes.front().label;
+  if (options_.order == "reverse") std::reverse(plan_.scenes.begin(), plan_.scenes.end());
+  if (options_.order == "resolution") SortByResolution(plan_.scenes);
+  plan_.leading = static_cast<std::size_t>(
+      std::find_if(plan_.scenes.begin(), plan_.scenes.end(),
+                   [&](const ScenePlan& scene) { return scene.label == leading; }) -
+      plan_.scenes.begin());
+}
+
+void Planner::SortByResolution(std::vector<ScenePlan>& scenes) const {
   // The finest last, on top.
   const auto area = [&](const ScenePlan& scene) {
     for (const Candidate& candidate : candidates_) {

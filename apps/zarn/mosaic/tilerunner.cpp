@@ -23,6 +23,9 @@ namespace {
 // Keeps the rows of blocks of all scenes along a row of tiles, and what is being written.
 constexpr GIntBig kBlockCache = GIntBig{256} << 20;
 
+// A process may have about 1000 files open, and a scene may consist of some.
+constexpr std::size_t kMostOpen = 128;
+
 /// A scene in a tile, or a tile that no scene touches.
 struct Job {
   std::size_t tile;
@@ -61,9 +64,11 @@ class OpenScenes {
                  .mostSourcePixels = mostSourcePixels} {}
 
   std::shared_ptr<SceneFeed> At(std::size_t scene) {
-    std::shared_ptr<SceneFeed>& feed = feeds_[scene];
-    if (!feed) feed = std::make_shared<SceneFeed>(plan_.scenes[scene], request_);
-    return feed;
+    if (!feeds_.contains(scene) && feeds_.size() == kMostOpen) CloseLeastRecent();
+    Feed& feed = feeds_[scene];
+    feed.used = ++uses_;
+    if (!feed.scene) feed.scene = std::make_shared<SceneFeed>(plan_.scenes[scene], request_);
+    return feed.scene;
   }
 
   /// Closes those that end above a row; work that is under way keeps them.
@@ -75,9 +80,21 @@ class OpenScenes {
   }
 
  private:
+  struct Feed {
+    std::shared_ptr<SceneFeed> scene;
+    std::size_t used = 0;
+  };
+
+  void CloseLeastRecent() {
+    feeds_.erase(std::min_element(feeds_.begin(), feeds_.end(), [](const auto& a, const auto& b) {
+      return a.second.used < b.second.used;
+    }));
+  }
+
   const MosaicPlan& plan_;
   FeedRequest request_;
-  std::map<std::size_t, std::shared_ptr<SceneFeed>> feeds_;
+  std::map<std::size_t, Feed> feeds_;
+  std::size_t uses_ = 0;
 };
 
 struct Slot {
@@ -97,8 +114,7 @@ std::int64_t MostSourcePixels(std::size_t pixelBytes, const WorkOptions& work) {
 }
 
 void RunTiles(const MosaicPlan& plan, const RasterSource& like, const std::vector<TilePlan>& tiles,
-              const WorkOptions& work, SinkKind kind, const TileSink& sink,
-              nspio::Counter& progress) {
+              const WorkOptions& work, const TileSink& sink, nspio::Counter& progress) {
   if (CPLGetConfigOption("GDAL_CACHEMAX", nullptr) == nullptr) GDALSetCacheMax64(kBlockCache);
   const std::vector<Job> jobs = JobsOf(plan, tiles);
   const std::size_t bands = like.Channels().size() + like.Alphas().size();
@@ -135,7 +151,7 @@ void RunTiles(const MosaicPlan& plan, const RasterSource& like, const std::vecto
   };
   const int count = work.threads > 0 ? work.threads : sys::OMPGetMaxThreads();
   const sys::OMPThreadCount threads(count);
-  if (count == 1 || kind == SinkKind::kAlone) {
+  if (count == 1) {
     RunOnOneThread(jobs.size(), kStreamSlots, {read, paste, write});
   } else {
     RunPipeline(jobs.size(), kStreamSlots, {read, paste, write}, 1);

@@ -17,20 +17,13 @@ namespace zarn::app {
 /// Takes a tile that is done; its contents may be changed.
 using TileSink = std::function<void(const TilePlan& tile, TileBuffers& buffers)>;
 
-/// Whether a sink may work while scenes are read. One that opens and publishes outputs may not: it
-/// looks through all open rasters, so as not to replace one of them, and reading opens and closes
-/// scenes.
-enum class SinkKind { kConcurrent, kAlone };
-
 /// Makes tiles of a mosaic one after the other: while one scene is read, the one before is pasted
 /// and the tile before is written. Scenes are open only as long as tiles need them, provided that
-/// tiles come row by row. With one thread, or a sink that works alone, nothing overlaps. Throws
-/// `RunError`.
+/// tiles come row by row. With one thread nothing overlaps. Throws `RunError`.
 ///
-/// `like` is the first scene; `progress` counts scenes in tiles.
+/// `like` is the leading scene; `progress` counts scenes in tiles.
 void RunTiles(const MosaicPlan& plan, const RasterSource& like, const std::vector<TilePlan>& tiles,
-              const WorkOptions& work, SinkKind kind, const TileSink& sink,
-              nspio::Counter& progress);
+              const WorkOptions& work, const TileSink& sink, nspio::Counter& progress);
 
 /// How many pixels of that many bytes may be read at a time for one window in work.
 std::int64_t MostSourcePixels(std::size_t pixelBytes, const WorkOptions& work);

@@ -238,17 +238,18 @@ TEST_F(Mosaicking, DoesNotDependOnThreadsMemoryTilesOrPieces) {
   const Arguments finish{"mosaic", "finish", plan, "--overwrite"};
   ExpectOneLine(RunProgram(finish), 1, "4 of 20 tiles are missing");
   // A tile of another plan does not count, and those that are there are not made again.
-  fs::copy_file(folder_ / "job.tiles/tile_000001.tif", folder_ / "job.tiles/tile_000017.tif");
+  fs::copy_file(folder_ / "job.json.tiles/tile_000001.tif",
+                folder_ / "job.json.tiles/tile_000017.tif");
   const OpenDataset stale(
-      GDALDataset::Open((folder_ / "job.tiles/tile_000017.tif").c_str(), GDAL_OF_UPDATE));
+      GDALDataset::Open((folder_ / "job.json.tiles/tile_000017.tif").c_str(), GDAL_OF_UPDATE));
   ASSERT_EQ(stale->SetMetadataItem("ZARN_PLAN", "other"), CE_None);
   stale->FlushCache(true);
   // Neither does one that was cut off.
-  const std::string cut = folder_ / "job.tiles/tile_000005.tif";
+  const std::string cut = folder_ / "job.json.tiles/tile_000005.tif";
   fs::resize_file(cut, fs::file_size(cut) / 2);
-  const auto before = fs::last_write_time(folder_ / "job.tiles/tile_000003.tif");
+  const auto before = fs::last_write_time(folder_ / "job.json.tiles/tile_000003.tif");
   Run({"mosaic", "run", plan});
-  EXPECT_EQ(fs::last_write_time(folder_ / "job.tiles/tile_000003.tif"), before);
+  EXPECT_EQ(fs::last_write_time(folder_ / "job.json.tiles/tile_000003.tif"), before);
   Run(finish);
   EXPECT_EQ(BytesOf(folder_ / "pieces.tif") == BytesOf(folder_ / "one.tif"), true);
   EXPECT_EQ(BytesOf(folder_ / "map.tif") == oneMap, true);
@@ -260,6 +261,31 @@ TEST_F(Mosaicking, DoesNotDependOnThreadsMemoryTilesOrPieces) {
                "COG");
   Run({"mosaic", "finish", plan, "--overwrite", "--of", "VRT"});
   EXPECT_EQ(Difference(expected, Read(folder_ / "pieces.tif")), "");
+}
+
+TEST_F(Mosaicking, AVrtOfTilesIsDescribedAndFilledLikeAnyOtherOutput) {
+  WriteScenes(ThreeScenes());
+  const OpenDataset scene(GDALDataset::Open(files_[0].c_str(), GDAL_OF_UPDATE));
+  scene->SetMetadataItem("SENSOR", "one");
+  scene->GetRasterBand(2)->SetDescription("green");
+  scene->FlushCache(true);
+  // A no-data pixel that is not the same in all bands.
+  const Arguments options{"--dst-nodata", "0,7,255", "--tile-size", "128", "--order", "reverse"};
+  Run(Command(options, "whole.tif"));
+  const std::string plan = folder_ / "job.json";
+  Arguments planning = Command(options, "tiles.vrt");
+  planning.insert(planning.begin() + 1, {"plan", "-o", plan});
+  Run(planning);
+  Run({"mosaic", "run", plan});
+  Run({"mosaic", "finish", plan});
+  EXPECT_EQ(Difference(Read(folder_ / "whole.tif"), Read(folder_ / "tiles.vrt")), "");
+  for (const char* const name : {"whole.tif", "tiles.vrt"}) {
+    SCOPED_TRACE(name);
+    const OpenDataset output = OpenImage(folder_ / name);
+    EXPECT_STREQ(output->GetMetadataItem("SENSOR"), "one");
+    EXPECT_STREQ(output->GetMetadataItem("NODATA_VALUES"), "0 7 255");
+    EXPECT_STREQ(output->GetRasterBand(2)->GetDescription(), "green");
+  }
 }
 
 TEST_F(Mosaicking, SeamsThatWereWrittenGiveTheSameMosaicAgain) {
@@ -336,6 +362,11 @@ TEST_F(Mosaicking, TakesOptionsFromAFile) {
             R"(", "feather": 4, "order": "reverse", "overwrite": true})");
   Run({"mosaic", "--config", folder_ / "config.json", "--feather", "9"});
   EXPECT_EQ(Difference(expected, Read(folder_ / "mosaic.tif")), "");
+  Run({"mosaic", "--config", folder_ / "config.json", "--feather", "9", folder_ / "other.tif"});
+  EXPECT_TRUE(fs::exists(folder_ / "other.tif"));
+  configure(R"({"feather": 3, "feather": 4})");
+  ExpectOneLine(RunProgram(Command({"--config", folder_ / "config.json"}, "x.tif")), 2,
+                "'feather' is there twice");
   configure(R"({"fether": 3})");
   ExpectOneLine(RunProgram(Command({"--config", folder_ / "config.json"}, "x.tif")), 2,
                 "there is no option 'fether'");
@@ -373,6 +404,9 @@ TEST_F(Mosaicking, RefusesWhatCannotWorkBeforeItBegins) {
       {{files_[2], out, "--cutlines", folder_ / "missing.gpkg"}, 1, "has no cutline for"},
       {{files_[0], out, "--cutlines", cutlines, "--cutline-id", "fid2"}, 2, "has no field 'fid2'"},
       {{files_[0], out, "--stop-on-nodata"}, 2, "needs --cutlines"},
+      {{files_[0], files_[1], out, "--feather", "3", "--seams", "none"}, 2, "no cutlines"},
+      {{files_[0], out, "--filter-size", "5"}, 2, "needs --filter"},
+      {{files_[0], out, "--write-cutlines", folder_ / "x.gpkg"}, 2, "has no seams"},
       {{files_[0], files_[1], out, "--cutlines", cutlines, "--stop-on-nodata"},
        1,
        "inside of its cutline"},
