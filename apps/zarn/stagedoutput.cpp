@@ -17,6 +17,12 @@ namespace zarn::app {
 namespace fs = std::filesystem;
 namespace {
 
+// What drivers say that cannot hold one does not tell.
+constexpr const char* kMaskAdvice =
+    "; if the format has no mask bands, mark pixels without data by a value (--dst-nodata) or "
+    "write "
+    "a GeoTIFF";
+
 std::string TargetBesideInputs(const OutputOptions& options) {
   if (options.apartFromInputs) return options.target;
   std::vector<fs::path> files = SideFiles(options.target);
@@ -131,7 +137,10 @@ void StagedOutput::CopyToFormat(nspio::Counter& progress) {
   errno = 0;
   DatasetPtr copy(format_.Driver().CreateCopy(staging_.StagedFile().c_str(), scratch.get(), FALSE,
                                               options_.List(), UpdateCounter, &progress));
-  if (!copy || IsSpaceError(errno)) FailWriting(Name(), LastGdalMessage(Name()));
+  if (!copy || IsSpaceError(errno)) {
+    const bool masked = scratch->GetRasterBand(1)->GetMaskFlags() == GMF_PER_DATASET;
+    FailWriting(Name(), LastGdalMessage(Name()) + (masked ? kMaskAdvice : ""));
+  }
   CloseChecked(std::move(copy), Name());
   scratch.reset();
   fs::remove(staging_.Scratch());

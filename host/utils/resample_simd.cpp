@@ -22,8 +22,8 @@
 // foreach_target.h must come first.
 #include <hwy/highway.h>
 
-#ifndef ZARN_HOST_UTILS_RESAMPLE_SIMD_CPP_
-#define ZARN_HOST_UTILS_RESAMPLE_SIMD_CPP_
+#ifndef ZARN_HOST_UTILS_RESAMPLE_SIMD_CPP
+#define ZARN_HOST_UTILS_RESAMPLE_SIMD_CPP
 
 namespace zarn::utils {
 

@@ -3,11 +3,11 @@
 // Sums of pooled samples and their quotients, compiled once per vector target. Include it only from
 // a `_simd.cpp` that Highway's foreach_target.h compiles repeatedly, after hwy/highway.h.
 
-#if defined(ZARN_ATTRIBUTE_POOLSUMS_SIMD_H_) == defined(HWY_TARGET_TOGGLE)
-#ifdef ZARN_ATTRIBUTE_POOLSUMS_SIMD_H_
-#undef ZARN_ATTRIBUTE_POOLSUMS_SIMD_H_
+#if defined(ZARN_ATTRIBUTE_POOLSUMS_SIMD_H) == defined(HWY_TARGET_TOGGLE)
+#ifdef ZARN_ATTRIBUTE_POOLSUMS_SIMD_H
+#undef ZARN_ATTRIBUTE_POOLSUMS_SIMD_H
 #else
-#define ZARN_ATTRIBUTE_POOLSUMS_SIMD_H_
+#define ZARN_ATTRIBUTE_POOLSUMS_SIMD_H
 #endif
 
 #include <hwy/highway.h>

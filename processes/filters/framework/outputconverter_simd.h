@@ -2,11 +2,11 @@
 // Output converters on vectors of doubles, compiled once per vector target: see pixelvectors_simd.h
 // for how to include it.
 
-#if defined(ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H_) == defined(HWY_TARGET_TOGGLE)
-#ifdef ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H_
-#undef ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H_
+#if defined(ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H) == defined(HWY_TARGET_TOGGLE)
+#ifdef ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H
+#undef ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H
 #else
-#define ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H_
+#define ZARN_FRAMEWORK_OUTPUTCONVERTER_SIMD_H
 #endif
 
 #include <hwy/highway.h>

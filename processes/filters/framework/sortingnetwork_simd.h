@@ -3,11 +3,11 @@
 // Sorting networks over vectors, compiled once per vector target. Include it only from a
 // `_simd.cpp` that Highway's foreach_target.h compiles repeatedly, after hwy/highway.h.
 
-#if defined(ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H_) == defined(HWY_TARGET_TOGGLE)
-#ifdef ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H_
-#undef ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H_
+#if defined(ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H) == defined(HWY_TARGET_TOGGLE)
+#ifdef ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H
+#undef ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H
 #else
-#define ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H_
+#define ZARN_FRAMEWORK_SORTINGNETWORK_SIMD_H
 #endif
 
 #include <hwy/highway.h>

@@ -3,11 +3,11 @@
 // From window sums to output samples, compiled once per vector target: see boxsums_simd.h for how
 // to include it.
 
-#if defined(ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H_) == defined(HWY_TARGET_TOGGLE)
-#ifdef ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H_
-#undef ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H_
+#if defined(ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H) == defined(HWY_TARGET_TOGGLE)
+#ifdef ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H
+#undef ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H
 #else
-#define ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H_
+#define ZARN_NEIGHBOURHOOD_AVERAGEMEANS_SIMD_H
 #endif
 
 #include <hwy/highway.h>

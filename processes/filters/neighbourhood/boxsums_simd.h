@@ -6,11 +6,11 @@
 // Rows are padded: every kernel may read up to kRowPadding elements past the length that it is
 // given, and write as many past the end of scratch rows, so none has a scalar tail.
 
-#if defined(ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H_) == defined(HWY_TARGET_TOGGLE)
-#ifdef ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H_
-#undef ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H_
+#if defined(ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H) == defined(HWY_TARGET_TOGGLE)
+#ifdef ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H
+#undef ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H
 #else
-#define ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H_
+#define ZARN_NEIGHBOURHOOD_BOXSUMS_SIMD_H
 #endif
 
 #include <hwy/highway.h>

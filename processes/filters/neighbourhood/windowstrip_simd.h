@@ -3,11 +3,11 @@
 // How the vector kernels of the square-window filters read and write a strip of columns, compiled
 // once per vector target: see boxsums_simd.h for how to include it.
 
-#if defined(ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H_) == defined(HWY_TARGET_TOGGLE)
-#ifdef ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H_
-#undef ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H_
+#if defined(ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H) == defined(HWY_TARGET_TOGGLE)
+#ifdef ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H
+#undef ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H
 #else
-#define ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H_
+#define ZARN_NEIGHBOURHOOD_WINDOWSTRIP_SIMD_H
 #endif
 
 #include <hwy/cache_control.h>
