@@ -68,9 +68,10 @@ def write_cutlines(name):
 
     def border(a, b, fixed, outer):
         along = np.linspace(a, b, count + 1)
-        off = np.zeros(count + 1) if outer else random.uniform(-10, 10, count + 1)
-        off[0] = off[-1] = 0
-        return along, fixed + off
+        # Borders that meet in a corner must not cross.
+        most = np.minimum(10, 0.4 * np.minimum(along - a, b - along))
+        share = 0 if outer else random.uniform(-1, 1, count + 1)
+        return along, fixed + most * share
 
     across = {}
     for k in range(COUNT + 1):

@@ -20,4 +20,14 @@ inline Window Intersection(const Window& a, const Window& b) {
 
 inline bool Meet(const Window& a, const Window& b) { return !IsEmpty(Intersection(a, b)); }
 
+/// The smallest window that holds both; an empty one adds nothing.
+inline Window Union(const Window& a, const Window& b) {
+  if (IsEmpty(a)) return b;
+  if (IsEmpty(b)) return a;
+  const std::int64_t x = std::min(a.x, b.x);
+  const std::int64_t y = std::min(a.y, b.y);
+  return {x, y, std::max(a.x + a.width, b.x + b.width) - x,
+          std::max(a.y + a.height, b.y + b.height) - y};
+}
+
 }  // namespace zarn::app

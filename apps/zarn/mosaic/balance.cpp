@@ -5,7 +5,6 @@
 #include <array>
 #include <cmath>
 #include <limits>
-#include <map>
 #include <memory>
 #include <numeric>
 #include <type_traits>
@@ -16,6 +15,7 @@
 #include "apps/zarn/estimate/gainoffsetnetwork.h"
 #include "apps/zarn/estimate/sceneset.h"
 #include "apps/zarn/progress.h"
+#include "apps/zarn/windowgeometry.h"
 #include "host/mosaic/griddodgingsurface.h"
 
 namespace zarn::app {
@@ -113,9 +113,10 @@ class Network {
 
   // Onto the first one, a reference image.
   void FitOntoReference(std::vector<ScenePlan>& scenes) const {
-    const std::vector<std::vector<double>> targets = Targets(1, [&](std::size_t, const auto& cell) {
-      return std::vector<double>(cell.values, cell.values + survey_.channels);
-    });
+    const std::vector<std::vector<double>> targets =
+        Targets(1, [&](std::size_t, const auto& cell, double* values) {
+          std::copy_n(cell.values, survey_.channels, values);
+        });
     for (std::size_t i = 1; i < order_.size(); ++i) {
       Fit(Pairs(targets[i], i, {}), i, GainLimits{}, scenes[order_[i]]);
     }
@@ -139,16 +140,18 @@ class Network {
     corrections.reserve(before.size());
     for (const ScenePlan& plan : before) corrections.emplace_back(plan);
     for (int round = 0; round < kRounds; ++round) {
-      std::vector<std::vector<double>> targets = Targets(
-          order_.size(),
-          [&](std::size_t scene, const Cell& cell) { return Corrected(corrections[scene], cell); });
+      std::vector<std::vector<double>> targets =
+          Targets(order_.size(), [&](std::size_t scene, const Cell& cell, double* values) {
+            Correct(corrections[scene], cell, values);
+          });
       for (std::size_t i = holdsFirst ? 1 : 0; i < order_.size(); ++i) {
         if (holdsFirst) LetFirstRule(i, targets[i]);
         Correction balanced(before[i]);
         std::vector<double> values;
         VisitCells(i, [&](const Cell& cell) {
-          const std::vector<double> corrected = Corrected(balanced, cell);
-          values.insert(values.end(), corrected.begin(), corrected.end());
+          const std::size_t at = values.size();
+          values.resize(at + survey_.channels);
+          if (!std::isnan(targets[i][at])) Correct(balanced, cell, &values[at]);
         });
         ScenePlan& scene = scenes[order_[i]];
         Fit(Pairs(targets[i], i, values), i, {.damping = kFirm, .contrast = 0}, scene);
@@ -179,16 +182,65 @@ class Network {
     }
   }
 
-  std::vector<double> Corrected(Correction& correction, const Cell& cell) const {
+  void Correct(Correction& correction, const Cell& cell, double* corrected) const {
     const CellLattice& lattice = set_->Cells(0).Lattice();
     const std::array<double, 6>& t = survey_.lattice.transform;
     // The mosaic's grid lies along the axes of its map.
     const double x = (lattice.CentreX(cell.column) - t[0]) / t[1] * survey_.step;
     const double y = (lattice.CentreY(cell.row) - t[3]) / t[5] * survey_.step;
-    std::vector<double> corrected(cell.values, cell.values + survey_.channels);
+    std::copy_n(cell.values, survey_.channels, corrected);
     correction(static_cast<unsigned>(std::max(0.0, x)), static_cast<unsigned>(std::max(0.0, y)),
-               corrected.data());
-    return corrected;
+               corrected);
+  }
+
+  /// Means over scenes, by cell, where there are at least so many.
+  class Means {
+   public:
+    Means(const Window& cells, std::size_t channels, int least)
+        : cells_(cells),
+          channels_(channels),
+          least_(least),
+          sums_(static_cast<std::size_t>(cells.width * cells.height) * channels),
+          counts_(static_cast<std::size_t>(cells.width * cells.height)) {}
+
+    // All cells are counted before the first value is added.
+    void Count(const Cell& cell) { ++counts_[PlaceOf(cell)]; }
+    bool Wants(const Cell& cell) const {
+      return Meet({cell.column, cell.row, 1, 1}, cells_) && counts_[PlaceOf(cell)] >= least_;
+    }
+    void Add(const Cell& cell, const double* values) {
+      double* const sums = &sums_[PlaceOf(cell) * channels_];
+      for (std::size_t c = 0; c < channels_; ++c) sums[c] += values[c];
+    }
+    void Get(const Cell& cell, double* means) const {
+      const bool known = Wants(cell);
+      for (std::size_t c = 0; c < channels_; ++c) {
+        means[c] = known ? sums_[PlaceOf(cell) * channels_ + c] / counts_[PlaceOf(cell)]
+                         : std::numeric_limits<double>::quiet_NaN();
+      }
+    }
+
+   private:
+    std::size_t PlaceOf(const Cell& cell) const {
+      return static_cast<std::size_t>((cell.row - cells_.y) * cells_.width + cell.column -
+                                      cells_.x);
+    }
+
+    Window cells_;
+    std::size_t channels_;
+    int least_;
+    std::vector<double> sums_;
+    std::vector<int> counts_;
+  };
+
+  // The cells that the first `count` scenes lie in.
+  Window CellsOf(std::size_t count) const {
+    Window all;
+    for (std::size_t i = 0; i < count; ++i) {
+      const CellMeans& cells = set_->Cells(i);
+      all = Union(all, {cells.FirstColumn(), cells.FirstRow(), cells.Columns(), cells.Rows()});
+    }
+    return all;
   }
 
   // What the scenes are to become, per scene the cells one after the other, [cell][channel]: the
@@ -196,30 +248,24 @@ class Network {
   // several.
   template <typename Value>
   std::vector<std::vector<double>> Targets(std::size_t count, const Value& value) const {
-    struct Sum {
-      std::vector<double> values;
-      int count = 0;
-    };
-    std::map<std::pair<std::int64_t, std::int64_t>, Sum> sums;
+    const std::size_t channels = survey_.channels;
+    Means means(CellsOf(count), channels, count == 1 ? 1 : 2);
+    for (std::size_t i = 0; i < count; ++i) {
+      VisitCells(i, [&](const Cell& cell) { means.Count(cell); });
+    }
+    std::vector<double> values(channels);
     for (std::size_t i = 0; i < count; ++i) {
       VisitCells(i, [&](const Cell& cell) {
-        Sum& sum = sums[{cell.row, cell.column}];
-        const std::vector<double> values = value(i, cell);
-        sum.values.resize(values.size());
-        for (std::size_t c = 0; c < values.size(); ++c) sum.values[c] += values[c];
-        ++sum.count;
+        if (!means.Wants(cell)) return;
+        value(i, cell, values.data());
+        means.Add(cell, values.data());
       });
     }
-    const int least = count == 1 ? 1 : 2;
     std::vector<std::vector<double>> targets(order_.size());
     for (std::size_t i = 0; i < order_.size(); ++i) {
       VisitCells(i, [&](const Cell& cell) {
-        const auto found = sums.find({cell.row, cell.column});
-        const bool known = found != sums.end() && found->second.count >= least;
-        for (std::size_t c = 0; c < survey_.channels; ++c) {
-          targets[i].push_back(known ? found->second.values[c] / found->second.count
-                                     : std::numeric_limits<double>::quiet_NaN());
-        }
+        targets[i].resize(targets[i].size() + channels);
+        means.Get(cell, targets[i].data() + targets[i].size() - channels);
       });
     }
     return targets;
