@@ -22,9 +22,10 @@ namespace {
 constexpr const char* kDescriptionsDiffer = "Raster dimensions don't match.";
 constexpr const char* kMapSize = "Invalid source map size";
 
-// Rows that share one look-up of their edges. Neighbouring slabs go to different threads, because
-// the work lies where the polygon is.
+// Rows that share one look-up of their edges.
 constexpr std::int64_t kSlabRows = 32;
+// The same where so many edges are that threads would wait for the one that has them.
+constexpr std::int64_t kShortSlabRows = 8;
 constexpr std::int64_t kSerialBelow = 129;
 
 bool SameDescription(const gobs::RasterInfo& a, const gobs::RasterInfo& b) {
@@ -53,24 +54,69 @@ std::vector<T> NoDataPixel(const std::vector<double>& list, const gobs::RasterIn
   return pairs;
 }
 
+// Rows of the block that are worked on together.
+struct Slab {
+  std::int64_t first;
+  std::int64_t end;
+};
+
+// All slabs, and the most that any of them has to do with.
+struct Slabs {
+  std::vector<Slab> slabs;
+  PolygonRowIndex::Crowd cutline;
+  PolygonRowIndex::Crowd tile;
+};
+
+// Cuts the rows `first` .. `last` of a block whose first row is `top` for so many threads. A slab
+// that is a good part of the work of one thread is cut again.
+Slabs CutSlabs(const PolygonRowIndex* cutline, const PolygonRowIndex* tile, std::int64_t top,
+               std::int64_t first, std::int64_t last, std::int64_t threads) {
+  constexpr std::size_t kPartsOfThread = 4;
+  Slabs cut;
+  std::vector<std::size_t> work;
+  std::size_t all = 0;
+  for (std::int64_t begin = first; begin <= last; begin += kSlabRows) {
+    const std::int64_t end = std::min(last + 1, begin + kSlabRows);
+    std::size_t& own = work.emplace_back(1);
+    for (const auto& [index, most] : {std::pair{cutline, &cut.cutline}, {tile, &cut.tile}}) {
+      if (index == nullptr) continue;
+      const PolygonRowIndex::Crowd crowd = index->CrowdOf(top + begin, top + end - 1);
+      own += crowd.places;
+      most->groups = std::max(most->groups, crowd.groups);
+      most->places = std::max(most->places, crowd.places);
+    }
+    all += own;
+  }
+  std::int64_t begin = first;
+  for (const std::size_t own : work) {
+    const std::int64_t slabEnd = std::min(last + 1, begin + kSlabRows);
+    const bool again =
+        threads > 1 && own * kPartsOfThread * static_cast<std::size_t>(threads) > all;
+    while (begin < slabEnd) {
+      const std::int64_t end = again ? std::min(slabEnd, begin + kShortSlabRows) : slabEnd;
+      cut.slabs.push_back({begin, end});
+      begin = end;
+    }
+  }
+  return cut;
+}
+
 // One thread's view of the polygons: what becomes of each row of its slabs.
 class RowPlanner {
  public:
   RowPlanner(const PolygonRowIndex* cutline, const PolygonRowIndex* tile, std::int64_t left,
-             std::size_t width, std::int64_t firstRow, std::int64_t lastRow) {
+             std::size_t width, const Slabs& slabs) {
     plan.copied.resize(WordsFor(width));
     plan.blended.resize(WordsFor(width));
     SetFirst(plan.copied, width);
     if (cutline != nullptr) {
-      const std::size_t most = MostEdges(*cutline, firstRow, lastRow, kSlabRows);
-      cutline_ = std::make_unique<InsideRows>(*cutline, left, width, most);
+      cutline_ = std::make_unique<InsideRows>(*cutline, left, width, slabs.cutline);
       if (cutline->Blend() > 0) {
-        band_ = std::make_unique<DistanceRows>(*cutline, left, width, most);
+        band_ = std::make_unique<DistanceRows>(*cutline, left, width, slabs.cutline);
       }
     }
     if (tile != nullptr) {
-      const std::size_t most = MostEdges(*tile, firstRow, lastRow, kSlabRows);
-      tile_ = std::make_unique<InsideRows>(*tile, left, width, most);
+      tile_ = std::make_unique<InsideRows>(*tile, left, width, slabs.tile);
       inTile_.resize(WordsFor(width));
     }
     whole_ = plan.copied;
@@ -120,20 +166,22 @@ bool ForEachPlan(const PolygonRowIndex* cutline, const PolygonRowIndex* tile, st
                  std::int64_t top, std::size_t width, std::int64_t first, std::int64_t last,
                  const Apply& apply) {
   const std::int64_t rows = last - first + 1;
-  const std::int64_t slabs = (rows + kSlabRows - 1) / kSlabRows;
   const bool parallel = rows >= kSerialBelow && parallel::MayShareOut();
-  const std::int64_t bands = parallel ? parallel::BandCount(slabs) : 1;
+  const std::int64_t threads = parallel ? parallel::BandCount(rows / kShortSlabRows) : 1;
+  const Slabs slabs = CutSlabs(cutline, tile, top, first, last, threads);
   std::vector<std::unique_ptr<RowPlanner>> planners;
-  for (std::int64_t band = 0; band < bands; ++band) {
-    planners.push_back(
-        std::make_unique<RowPlanner>(cutline, tile, left, width, top + first, top + last));
+  for (std::int64_t thread = 0; thread < threads; ++thread) {
+    planners.push_back(std::make_unique<RowPlanner>(cutline, tile, left, width, slabs));
   }
+  // Whoever is free takes the next slab: the work lies where the polygon is.
+  std::atomic<std::size_t> next = 0;
   std::atomic<bool> aborted = false;
-  parallel::ForEachRowBand(bands, bands, [&](std::ptrdiff_t band, std::ptrdiff_t, std::ptrdiff_t) {
-    RowPlanner& planner = *planners[static_cast<std::size_t>(band)];
-    for (std::int64_t slab = band; slab < slabs; slab += bands) {
-      const std::int64_t begin = first + slab * kSlabRows;
-      const std::int64_t end = std::min(last + 1, begin + kSlabRows);
+  const auto work = [&](std::ptrdiff_t thread, std::ptrdiff_t, std::ptrdiff_t) {
+    RowPlanner& planner = *planners[static_cast<std::size_t>(thread)];
+    for (;;) {
+      const std::size_t taken = next.fetch_add(1, std::memory_order_relaxed);
+      if (taken >= slabs.slabs.size()) return;
+      const auto [begin, end] = slabs.slabs[taken];
       planner.Prepare(top + begin, top + end - 1);
       for (std::int64_t row = begin; row < end; ++row) {
         if (aborted.load(std::memory_order_relaxed)) return;
@@ -143,7 +191,8 @@ bool ForEachPlan(const PolygonRowIndex* cutline, const PolygonRowIndex* tile, st
         }
       }
     }
-  });
+  };
+  parallel::ForEachRowBand(threads, threads, work);
   return !aborted.load(std::memory_order_relaxed);
 }
 

@@ -42,19 +42,19 @@ ZARN_VECTORISED void SpreadBounds(const double* bounds, std::size_t width, std::
 }  // namespace
 
 DistanceRows::DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
-                           std::size_t mostGroups)
+                           const PolygonRowIndex::Crowd& most)
     : index_(index),
       left_(static_cast<double>(left)),
       width_(width),
       reach_(index.Blend() + index.DistanceTolerance()),
-      groups_(mostGroups),
-      grouped_(mostGroups),
+      groups_(most.groups),
+      grouped_(most.places),
       bounds_(width),
       spread_(width),
-      narrow_(mostGroups),
+      narrow_(most.groups),
       narrowWords_(WordsFor(WordsFor(width))),
-      near_(mostGroups),
-      ordered_(mostGroups),
+      near_(most.groups),
+      ordered_(most.groups),
       vectors_(UseVectors()),
       distances_(WordsFor(width) * kWordColumns),
       touched_(WordsFor(WordsFor(width))),

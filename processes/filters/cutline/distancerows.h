@@ -21,10 +21,10 @@ namespace zarn::processes::filters {
 /// is looked at in those columns only where it may be nearer.
 class DistanceRows {
  public:
-  /// For rows of `width` pixels from column `left` on. Keeps the address of `index`; `mostGroups`
-  /// is the most that `Prepare` will meet.
+  /// For rows of `width` pixels from column `left` on. Keeps the address of `index`; `most` is
+  /// the most that `Prepare` will meet.
   DistanceRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
-               std::size_t mostGroups);
+               const PolygonRowIndex::Crowd& most);
 
   /// Collects the edges of the rows `first` .. `last`.
   void Prepare(std::int64_t first, std::int64_t last);

@@ -6,12 +6,10 @@
 
 namespace zarn::processes::filters {
 
-GroupedEdges::GroupedEdges(std::size_t mostEdges) {
+GroupedEdges::GroupedEdges(std::size_t mostPlaces) {
   constexpr std::size_t kWidestVector = 8;
-  // Two edges take up a whole part.
-  const std::size_t most = 2 * mostEdges + kWidestVector;
-  for (std::vector<double>& numbers : edges) numbers.resize(most);
-  for (std::vector<double>& bounds : boxes) bounds.resize(most);
+  for (std::vector<double>& numbers : edges) numbers.resize(mostPlaces + kWidestVector);
+  for (std::vector<double>& bounds : boxes) bounds.resize(mostPlaces / kPart + kWidestVector);
 }
 
 std::size_t GroupedEdges::Put(const PolygonEdge* group, std::size_t count, double tolerance,

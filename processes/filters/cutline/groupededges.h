@@ -25,8 +25,13 @@ struct GroupedEdges {
   /// Of each part: the box that no distance computed to it is below that to.
   enum Bound : std::uint8_t { kMinX, kMaxX, kMinY, kMaxY, kBounds };
 
-  /// Has room for so many edges in groups of two or more.
-  explicit GroupedEdges(std::size_t mostEdges);
+  /// How many places a group of so many edges takes up.
+  static constexpr std::size_t PlacesFor(std::size_t count) {
+    return (count + kPart - 1) / kPart * kPart;
+  }
+
+  /// Has room for so many places.
+  explicit GroupedEdges(std::size_t mostPlaces);
 
   /// Lays a group out from `place` on, a multiple of `kPart`; returns the place after it. A
   /// computed distance may differ from the true one by `tolerance`.

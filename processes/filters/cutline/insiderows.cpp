@@ -47,12 +47,12 @@ ZARN_VECTORISED void EstimateColumns(double* numbers, std::size_t pitch, std::si
 }  // namespace
 
 InsideRows::InsideRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
-                       std::size_t mostEdges)
+                       const PolygonRowIndex::Crowd& most)
     : index_(index),
       left_(static_cast<double>(left)),
       width_(width),
-      edges_(mostEdges),
-      numbers_(kNumbers * mostEdges) {}
+      edges_(most.places),
+      numbers_(kNumbers * most.places) {}
 
 void InsideRows::Prepare(std::int64_t first, std::int64_t last) {
   count_ = 0;
@@ -126,19 +126,6 @@ void InsideRows::Compute(std::int64_t row, PixelBits& inside) {
   if (width_ % kWordColumns != 0) {
     inside.back() &= (std::uint64_t{1} << width_ % kWordColumns) - 1;
   }
-}
-
-std::size_t MostEdges(const PolygonRowIndex& index, std::int64_t first, std::int64_t last,
-                      std::int64_t slabRows) {
-  std::size_t most = 0;
-  for (std::int64_t row = first; row <= last; row += slabRows) {
-    std::size_t edges = 0;
-    index.ForEachGroup(
-        row, std::min(last, row + slabRows - 1),
-        [&](const PolygonRowIndex::Group& group) { edges += group.end - group.begin; });
-    most = std::max(most, edges);
-  }
-  return most;
 }
 
 }  // namespace zarn::processes::filters

@@ -16,10 +16,10 @@ namespace zarn::processes::filters {
 /// others do not. So each edge is turned into its column once, and the columns toggle.
 class InsideRows {
  public:
-  /// For rows of `width` pixels from column `left` on. Keeps the address of `index`; `mostEdges` is
+  /// For rows of `width` pixels from column `left` on. Keeps the address of `index`; `most` is
   /// the most that `Prepare` will meet.
   InsideRows(const PolygonRowIndex& index, std::int64_t left, std::size_t width,
-             std::size_t mostEdges);
+             const PolygonRowIndex::Crowd& most);
 
   /// Collects the edges of the rows `first` .. `last`.
   void Prepare(std::int64_t first, std::int64_t last);
@@ -37,9 +37,5 @@ class InsideRows {
   std::vector<const PolygonEdge*> edges_;
   std::vector<double> numbers_;
 };
-
-/// The most edges that any slab of `slabRows` rows among `first` .. `last` has to do with.
-std::size_t MostEdges(const PolygonRowIndex& index, std::int64_t first, std::int64_t last,
-                      std::int64_t slabRows);
 
 }  // namespace zarn::processes::filters

@@ -5,6 +5,8 @@
 #include <cmath>
 #include <limits>
 
+#include "processes/filters/cutline/groupededges.h"
+
 namespace zarn::processes::filters {
 namespace {
 
@@ -118,6 +120,15 @@ void PolygonRowIndex::FormGroups() {
     if (i % kBlock == 0) blocks_.push_back({groups_[i].firstRow, groups_[i].lastRow});
     blocks_.back().lastRow = std::max(blocks_.back().lastRow, groups_[i].lastRow);
   }
+}
+
+PolygonRowIndex::Crowd PolygonRowIndex::CrowdOf(std::int64_t first, std::int64_t last) const {
+  Crowd crowd;
+  ForEachGroup(first, last, [&](const Group& group) {
+    ++crowd.groups;
+    crowd.places += GroupedEdges::PlacesFor(group.end - group.begin);
+  });
+  return crowd;
 }
 
 bool PolygonRowIndex::IsInside(double x, double y) const {

@@ -33,6 +33,12 @@ class PolygonRowIndex {
     std::int64_t lastShared;   ///< the last one
   };
 
+  /// How much some rows have to do with.
+  struct Crowd {
+    std::size_t groups = 0;
+    std::size_t places = 0;  ///< of their edges, as `GroupedEdges` lays them out
+  };
+
   /// Copies the vertices; `blend` is the half width of the band in pixels, 0 for none.
   PolygonRowIndex(const PolygonParam& polygon, std::uint32_t blend);
 
@@ -53,6 +59,9 @@ class PolygonRowIndex {
 
   /// What a computed distance may differ by from the true one.
   double DistanceTolerance() const { return distanceTolerance_; }
+
+  /// Counts what the rows `first` .. `last` have to do with.
+  Crowd CrowdOf(std::int64_t first, std::int64_t last) const;
 
   /// Calls `use(group)` for the groups that have to do with any of the rows `first` .. `last`.
   template <typename Use>
