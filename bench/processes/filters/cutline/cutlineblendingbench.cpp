@@ -136,6 +136,27 @@ void PasteWithOpenCV(const Points& points, unsigned blend) {
   }
 }
 
+void Paste(IFilter& filter, int threads) {
+  omp_set_num_threads(threads);
+  Blocks& blocks = Blocks::Shared();
+  if (!filter.Process(blocks.source, blocks.mosaic, 0, 0, nullptr).Ok()) std::abort();
+}
+
+// Many vertices beside few, one thread.
+void RegisterGrowth(int few, int many, unsigned blend) {
+  const auto filterOf = [=](int count) {
+    return [=, filter = std::make_shared<std::unique_ptr<IFilter>>()] {
+      if (!*filter) {
+        filter->reset(CutlineBlendingFactory(Closed(Star(count, 0.25)), blend).GetCPUFilter());
+      }
+      Paste(**filter, 1);
+    };
+  };
+  Compare({"cutline growth " + std::to_string(few) + " to " + std::to_string(many) + " feather " +
+               std::to_string(blend),
+           std::to_string(few) + " vertices", kBytes, filterOf(many), filterOf(few)});
+}
+
 void Register(const std::string& name, const std::function<Points()>& shape, unsigned blend) {
   static const int all = omp_get_max_threads();
   const auto points = std::make_shared<Points>();
@@ -145,9 +166,7 @@ void Register(const std::string& name, const std::function<Points()>& shape, uns
       *points = shape();
       filter->reset(CutlineBlendingFactory(Closed(*points), blend).GetCPUFilter());
     }
-    omp_set_num_threads(threads);
-    Blocks& blocks = Blocks::Shared();
-    if (!(*filter)->Process(blocks.source, blocks.mosaic, 0, 0, nullptr).Ok()) std::abort();
+    Paste(**filter, threads);
   };
   const std::string label = "cutline " + name + " feather " + std::to_string(blend);
   Compare({label + " threads 1", "OpenCV", kBytes, [=] { run(1); },
@@ -174,6 +193,7 @@ const bool kRegistered = [] {
     Register(
         "comb 2000", [] { return Comb(2000); }, blend);
   }
+  RegisterGrowth(100, 50000, 10);
   // Making the factory and its filter.
   Compare({"cutline index 20000", "copy into new memory", kBytes,
            [] {
