@@ -53,7 +53,7 @@ struct UniformBounds {
       v = hn::IfThenElse(hn::Lt(v, low), low, hn::IfThenElse(hn::Gt(v, high), high, v));
       // A wider tolerance covers the rounding of the difference.
       const auto distance = hn::Abs(hn::Sub(v, noData));
-      if (HWY_LIKELY(hn::AllFalse(d, hn::Lt(distance, hn::Set(d, T{2e-5}))))) return v;
+      if (HWY_LIKELY(hn::AllFalse(d, hn::Lt(distance, hn::Set(d, static_cast<T>(2e-5)))))) return v;
       return Avoided(d, v, noData, replacement);
     } else {
       v = hn::Min(hn::Max(v, low), high);
