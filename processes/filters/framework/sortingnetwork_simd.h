@@ -40,22 +40,76 @@ inline constexpr auto kSortingSteps = [] {
   return steps;
 }();
 
-template <class V>
-HWY_INLINE void SortPair(V& first, V& second) {
-  const V low = hn::Min(first, second);
-  second = hn::Max(first, second);
-  first = low;
-}
-template <std::size_t kCount, class V, std::size_t... kStep>
-HWY_INLINE void SortVectors(V* v, std::index_sequence<kStep...>) {
-  (SortPair(v[kSortingSteps<kCount>[kStep].first], v[kSortingSteps<kCount>[kStep].second]), ...);
+/// Loads a vector for the steps of a network.
+template <class D>
+HWY_INLINE hn::Vec<D> LoadForSteps(D d, const hn::TFromD<D>* from) {
+  auto v = hn::LoadU(d, from);
+#if HWY_ARCH_X86 && HWY_TARGET <= HWY_AVX3
+  // Numbers and bits are two types of vectors (see below): the compiler would load it for each.
+  asm("" : "+v"(v.raw));
+#endif
+  return v;
 }
 
-/// Sorts `kCount` vectors lane by lane. All of it is unrolled and inlined: steps whose results
-/// nobody looks at cost nothing.
-template <std::size_t kCount, class V>
+/// One step. Results that are not wanted are left out.
+template <bool kLesser = true, bool kGreater = true, class V>
+HWY_INLINE void SortPair(V& first, V& second) {
+  const V lesser = hn::Min(first, second);
+  if constexpr (kGreater) {
+#if HWY_ARCH_X86 && HWY_TARGET <= HWY_AVX3
+    // What is left of the two: comparisons have one port of the machine, bits have two.
+    second = kLesser ? hn::Xor3(first, second, lesser) : hn::Max(first, second);
+#else
+    second = hn::Max(first, second);
+#endif
+  }
+  if constexpr (kLesser) first = lesser;
+}
+
+/// Which results of the steps anything looks at.
+struct WantedResults {
+  bool lesser;
+  bool greater;
+};
+template <std::size_t kSteps>
+using SortingSteps = std::array<std::pair<std::size_t, std::size_t>, kSteps>;
+inline constexpr std::size_t kMostUnrolled = 64;  ///< places of such a network
+
+/// For those who look at places `first` .. `first` + `count` - 1 in the end.
+template <std::size_t kSteps>
+constexpr std::array<WantedResults, kSteps> WantedOfSteps(const SortingSteps<kSteps>& steps,
+                                                          std::size_t first, std::size_t count) {
+  std::array<WantedResults, kSteps> wanted{};
+  std::array<bool, kMostUnrolled> places{};
+  for (std::size_t i = 0; i < count; ++i) places[first + i] = true;
+  for (std::size_t i = kSteps; i-- > 0;) {
+    bool& lesser = places[steps[i].first];
+    bool& greater = places[steps[i].second];
+    wanted[i] = {lesser, greater};
+    lesser = greater = lesser || greater;
+  }
+  return wanted;
+}
+
+template <const auto& kSteps, const auto& kWanted, class V, std::size_t... kStep>
+HWY_INLINE void RunSteps(V* v, std::index_sequence<kStep...>) {
+  (SortPair<kWanted[kStep].lesser, kWanted[kStep].greater>(v[kSteps[kStep].first],
+                                                           v[kSteps[kStep].second]),
+   ...);
+}
+/// Runs the steps of a network as far as places `kFirst` .. `kFirst` + `kCount` - 1 need them. All
+/// of it is unrolled and inlined.
+template <const auto& kSteps, std::size_t kFirst, std::size_t kCount, class V>
+HWY_INLINE void RunSteps(V* v) {
+  static constexpr auto kWanted = WantedOfSteps(kSteps, kFirst, kCount);
+  RunSteps<kSteps, kWanted>(v, std::make_index_sequence<kSteps.size()>());
+}
+
+/// Sorts `kCount` vectors lane by lane, as far as places `kFirst` .. `kFirst` + `kTaken` - 1 need
+/// it.
+template <std::size_t kCount, std::size_t kFirst = 0, std::size_t kTaken = kCount, class V>
 HWY_INLINE void SortVectors(V* v) {
-  SortVectors<kCount>(v, std::make_index_sequence<kSortingSteps<kCount>.size()>());
+  RunSteps<kSortingSteps<kCount>, kFirst, kTaken>(v);
 }
 
 /// Runs a network on `kBlock` sets of unsigned keys at once: value i of all sets stands in the

@@ -91,42 +91,32 @@ struct SortedColumns {
   Key* Odd() const { return scratch + 3 * taps * pitch; }
 };
 
-/// Sorts four values that come as two sorted pairs.
-template <class V>
-HWY_INLINE void MergePairs(V* v) {
-  SortPair(v[0], v[2]);
-  SortPair(v[1], v[3]);
-  SortPair(v[1], v[2]);
-}
-/// Sorts values that come as sorted pairs and one more. Written as a choice of ranks, so that those
-/// nobody looks at cost nothing.
-template <class V>
-HWY_INLINE void SortPairs(V* v, std::integral_constant<std::size_t, 5>) {
-  MergePairs(v);
-  const V added = v[4];
-  v[4] = hn::Max(v[3], added);
-  v[3] = hn::Max(v[2], hn::Min(v[3], added));
-  v[2] = hn::Max(v[1], hn::Min(v[2], added));
-  v[1] = hn::Max(v[0], hn::Min(v[1], added));
-  v[0] = hn::Min(v[0], added);
-}
-template <class V>
-HWY_INLINE void SortPairs(V* v, std::integral_constant<std::size_t, 7>) {
-  MergePairs(v);
-  const V low = hn::Min(v[4], v[6]);
-  const V middle = hn::Max(v[4], hn::Min(v[5], v[6]));
-  const V high = hn::Max(v[5], v[6]);
-  // Batcher's merge of four and three: those in even places, those in odd ones, both together.
-  V even[4] = {hn::Min(v[0], low), hn::Max(v[0], low), hn::Min(v[2], high), hn::Max(v[2], high)};
-  SortPair(even[1], even[2]);
-  V odd[3] = {hn::Min(v[1], middle), hn::Max(v[1], middle), v[3]};
-  SortPair(odd[1], odd[2]);
-  v[0] = even[0];
-  for (std::size_t i = 0; i < 3; ++i) {
-    v[2 * i + 1] = hn::Min(odd[i], even[i + 1]);
-    v[2 * i + 2] = hn::Max(odd[i], even[i + 1]);
-  }
-}
+/// Sorts values that come as sorted pairs and one more: merges the first two pairs, then the rest
+/// into them.
+template <std::size_t kTaps>
+struct PairNetwork;
+template <>
+struct PairNetwork<5> {
+  static constexpr SortingSteps<7> kSteps = {
+      {{0, 2}, {1, 3}, {1, 2}, {3, 4}, {2, 3}, {1, 2}, {0, 1}}};
+};
+template <>
+struct PairNetwork<7> {
+  // (Batcher's merge of four and three: those in even places, those in odd ones, both together.)
+  static constexpr SortingSteps<13> kSteps = {{{0, 2},
+                                               {1, 3},
+                                               {1, 2},
+                                               {5, 6},
+                                               {4, 5},
+                                               {0, 4},
+                                               {2, 6},
+                                               {2, 4},
+                                               {1, 5},
+                                               {3, 5},
+                                               {1, 2},
+                                               {3, 4},
+                                               {5, 6}}};
+};
 
 template <std::size_t kTaps, bool kHoles>
 struct Selection {
@@ -170,7 +160,7 @@ struct Selection {
     constexpr std::size_t kLength = Length(kTaken.line);
     V values[kLength];
     CopyLine<kTaken.line>(grid, values, std::make_index_sequence<kLength>());
-    SortVectors<kLength>(values);
+    SortVectors<kLength, kTaken.first, kTaken.count>(values);
     Copy(values + kTaken.first, candidates + Count(kSpan),
          std::make_index_sequence<kTaken.count>());
   }
@@ -179,31 +169,34 @@ struct Selection {
     (TakeLine<kSpan>(grid, candidates), ...);
   }
 
-  /// Loads the values of one rank in all columns and sorts them.
-  template <class D, typename Key, class V>
-  static HWY_INLINE void LoadRank(D d, const SortedColumns<Key>& rows, std::size_t rank,
-                                  std::size_t i, V* row) {
-    const Key* const columns = rows.Column(rank) + i;
+  /// Loads the values of one rank in all columns and sorts them, as far as the lines need it.
+  template <std::size_t kRank, class D, typename Key, class V>
+  static HWY_INLINE void LoadRank(D d, const SortedColumns<Key>& rows, std::size_t i, V* row) {
+    constexpr std::size_t kFirstLine = Lines::kLines[0].line;
+    constexpr std::size_t kLastLine = Lines::kLines[kLineCount - 1].line;
+    constexpr std::size_t kFirst = kFirstLine < kRank ? 0 : kFirstLine - kRank;
+    constexpr std::size_t kEnd = std::min(kLastLine - kRank + 1, kTaps);
+    const Key* const columns = rows.Column(kRank) + i;
     if constexpr (kTaps == 3) {
-      row[0] = hn::LoadU(d, columns);
-      row[1] = hn::LoadU(d, columns + rows.step);
-      row[2] = hn::LoadU(d, columns + 2 * rows.step);
-      SortVectors<3>(row);
+      row[0] = LoadForSteps(d, columns);
+      row[1] = LoadForSteps(d, columns + rows.step);
+      row[2] = LoadForSteps(d, columns + 2 * rows.step);
+      SortVectors<3, kFirst, kEnd - kFirst>(row);
     } else {
-      const Key* const low = rows.Low(rank) + i;
-      const Key* const high = rows.High(rank) + i;
+      const Key* const low = rows.Low(kRank) + i;
+      const Key* const high = rows.High(kRank) + i;
       for (std::size_t pair = 0; pair < kTaps - 1; pair += 2) {
-        row[pair] = hn::LoadU(d, low + pair * rows.step);
-        row[pair + 1] = hn::LoadU(d, high + pair * rows.step);
+        row[pair] = LoadForSteps(d, low + pair * rows.step);
+        row[pair + 1] = LoadForSteps(d, high + pair * rows.step);
       }
-      row[kTaps - 1] = hn::LoadU(d, columns + (kTaps - 1) * rows.step);
-      SortPairs(row, std::integral_constant<std::size_t, kTaps>());
+      row[kTaps - 1] = LoadForSteps(d, columns + (kTaps - 1) * rows.step);
+      RunSteps<PairNetwork<kTaps>::kSteps, kFirst, kEnd - kFirst>(row);
     }
   }
   template <class D, typename Key, class V, std::size_t... kRank>
   static HWY_INLINE void LoadGrid(D d, const SortedColumns<Key>& rows, std::size_t i, V* grid,
                                   std::index_sequence<kRank...>) {
-    (LoadRank(d, rows, kRank, i, grid + kRank * kTaps), ...);
+    (LoadRank<kRank>(d, rows, i, grid + kRank * kTaps), ...);
   }
 };
 
@@ -216,7 +209,7 @@ HWY_INLINE hn::Vec<D> MedianOfColumns(D d, const SortedColumns<Key>& rows, std::
   Select::LoadGrid(d, rows, i, grid, std::make_index_sequence<kTaps>());
   V candidates[Select::Count()];
   Select::TakeLines(grid, candidates, std::make_index_sequence<Select::kLineCount>());
-  SortVectors<Select::Count()>(candidates);
+  SortVectors<Select::Count(), Select::kMedian, kHoles ? kTaps / 2 + 1 : 1>(candidates);
   V median = candidates[Select::kMedian];
   if constexpr (kHoles) {
     const Key* const oddColumns = rows.Odd() + i;
@@ -254,7 +247,7 @@ HWY_ATTR void SortColumns(const KeyWindows<Key>& windows, std::size_t first, std
   const Key* const excluded[kTaps] = {(kHoles ? windows.excluded[kRow] + first : nullptr)...};
   Key* const columns[kTaps] = {sorted.Column(kRow)...};
   for (std::size_t i = 0; i < length; i += hn::Lanes(d)) {
-    hn::Vec<decltype(d)> v[kTaps] = {hn::LoadU(d, rows[kRow] + i)...};
+    hn::Vec<decltype(d)> v[kTaps] = {LoadForSteps(d, rows[kRow] + i)...};
     if constexpr (kHoles) {
       auto fill = hn::Zero(d);
       (FillIn(d, excluded[kRow] + i, fill, v[kRow]), ...);
@@ -274,10 +267,11 @@ HWY_ATTR void PairColumns(const SortedColumns<Key>& rows, std::size_t length) {
     Key* const low = rows.Low(rank);
     Key* const high = rows.High(rank);
     for (std::size_t i = 0; i < length; i += hn::Lanes(d)) {
-      const auto left = hn::LoadU(d, columns + i);
-      const auto right = hn::LoadU(d, columns + i + rows.step);
-      hn::StoreU(hn::Min(left, right), d, low + i);
-      hn::StoreU(hn::Max(left, right), d, high + i);
+      auto lesser = LoadForSteps(d, columns + i);
+      auto greater = LoadForSteps(d, columns + i + rows.step);
+      SortPair(lesser, greater);
+      hn::StoreU(lesser, d, low + i);
+      hn::StoreU(greater, d, high + i);
     }
   }
 }
