@@ -234,8 +234,8 @@ HWY_ATTR inline void SlideSmall(const std::uint8_t* HWY_RESTRICT added,
 /// The windows of a row of samples.
 struct SmallMoments {
   const std::uint8_t* centre;
-  const std::int16_t* sums;       ///< of the windows
-  const std::int16_t* triangles;  ///< of the columns, from the window's left on
+  const std::int16_t* sums;       ///< of the columns, from the window's left on
+  const std::int16_t* triangles;  ///< the same
   const std::uint16_t* excluded;  ///< null: all samples count
   std::size_t taps;
   std::size_t step;
@@ -247,11 +247,15 @@ HWY_NOINLINE void JudgeSmallOneByOne(const SmallMoments& m, std::size_t first, s
   const auto window = static_cast<int>(m.taps * m.taps);
   for (std::size_t i = first; i < std::min(first + count, m.count); ++i) {
     const int n = window - (m.excluded == nullptr ? 0 : m.excluded[i]);
+    int shifted = 0;
     int triangles = window * kTriangleMiddle;
-    for (std::size_t t = 0; t < m.taps; ++t) triangles += m.triangles[i + t * m.step];
-    const int sum = m.sums[i] + kSmallMiddle * n;
+    for (std::size_t t = 0; t < m.taps; ++t) {
+      shifted += m.sums[i + t * m.step];
+      triangles += m.triangles[i + t * m.step];
+    }
+    const int sum = shifted + kSmallMiddle * n;
     const int squares =
-        2 * triangles + m.sums[i] + 2 * kSmallMiddle * m.sums[i] + kSmallMiddle * kSmallMiddle * n;
+        2 * triangles + shifted + 2 * kSmallMiddle * shifted + kSmallMiddle * kSmallMiddle * n;
     flags[i] = StandsOut(m.centre[i], n, sum, squares) ? 1 : 0;
   }
 }
@@ -271,32 +275,27 @@ HWY_INLINE hn::Vec<D32> PairProducts(D32 d, V16 a, V16 b) {
 #endif
 }
 
-/// Every other window of a vector, from the first or the second one on, as pairs of 16 bits.
-template <std::size_t kPhase>
-struct EveryOther {
+/// Half of the windows of a vector, as pairs of 16 bits: the lower or the upper ones of each block,
+/// so that `ReorderDemote2To` has them all in order again.
+template <bool kUpper>
+struct HalfBlocks {
   hn::ScalableTag<std::int16_t> d;
   hn::RepartitionToWide<decltype(d)> d32;
   hn::RepartitionToWide<hn::RebindToUnsigned<decltype(d)>> du32;
   using V = hn::Vec<hn::ScalableTag<std::int16_t>>;
 
-  /// From vectors of all windows.
   HWY_INLINE V Pairs(V first, V second) const {
-    if constexpr (kPhase == 0) {
-      second = hn::BitCast(d, hn::ShiftLeft<16>(hn::BitCast(du32, second)));
-    } else {
-      first = hn::BitCast(d, hn::ShiftRight<16>(hn::BitCast(du32, first)));
-    }
-    return hn::OddEven(second, first);
+    if constexpr (kUpper) return hn::InterleaveUpper(d, first, second);
+    return hn::InterleaveLower(d, first, second);
   }
-  /// From rows in memory. (The second may be read one element before its place.)
+  /// From rows in memory.
   HWY_INLINE V Pairs(const std::int16_t* first, const std::int16_t* second) const {
-    return hn::OddEven(hn::LoadU(d, second + kPhase - 1), hn::LoadU(d, first + kPhase));
+    return Pairs(hn::LoadU(d, first), hn::LoadU(d, second));
   }
-  HWY_INLINE V Pairs(V first, const std::int16_t* second) const {
-    if constexpr (kPhase == 1) {
-      first = hn::BitCast(d, hn::ShiftRight<16>(hn::BitCast(du32, first)));
-    }
-    return hn::OddEven(hn::LoadU(d, second + kPhase - 1), first);
+  /// The same pair everywhere.
+  HWY_INLINE V Pair(int first, int second) const {
+    return hn::OddEven(hn::Set(d, static_cast<std::int16_t>(second)),
+                       hn::Set(d, static_cast<std::int16_t>(first)));
   }
 };
 
@@ -312,105 +311,99 @@ struct SmallRule {
   static constexpr int kTriangles = 2 * kAllowed * kWindow;
 
   /// By how much the windows exceed the bound; `distance` is n * v - S, at least 0.
-  template <std::size_t kPhase, class V>
-  static HWY_INLINE auto Excess(const EveryOther<kPhase>& every, V distance, V sum,
-                                const std::int16_t* triangles, std::size_t step) {
-    const auto& d = every.d;
-    const auto& d32 = every.d32;
-    const auto times = [&](V v, int factor) HWY_ATTR {
-      return hn::Mul(v, hn::Set(d, static_cast<std::int16_t>(factor)));
-    };
-    const V weight = hn::Set(d, static_cast<std::int16_t>(-kTriangles));
-    const auto squares = PairProducts(d32, every.Pairs(distance, sum),
-                                      every.Pairs(times(distance, 4), times(sum, kAllowed / 8)));
-    const V factor = hn::Sub(times(sum, kAllowed % 8),
-                             hn::Set(d, static_cast<std::int16_t>(kAllowed * kWindow)));
-    const std::size_t last = (kTaps - 1) * step;
-    auto excess =
-        PairProducts(d32, every.Pairs(sum, triangles + last), every.Pairs(factor, weight));
+  template <class Half, class V>
+  static HWY_INLINE auto Excess(const Half& half, V distance, V sum, const std::int16_t* triangles,
+                                std::size_t step) {
+    const auto& d = half.d;
+    const auto& d32 = half.d32;
+    const V moments = half.Pairs(distance, sum);
+    const auto squares =
+        PairProducts(d32, moments, hn::Mul(moments, half.Pair(kActual / 8, kAllowed / 8)));
+    const V rest = half.Pairs(sum, hn::LoadU(d, triangles + (kTaps - 1) * step));
+    const V factors = hn::Add(hn::Mul(rest, half.Pair(kAllowed % 8, 0)),
+                              half.Pair(-kAllowed * kWindow, -kTriangles));
+    auto excess = hn::Add(PairProducts(d32, rest, factors), hn::ShiftLeft<3>(squares));
     for (std::size_t t = 0; t + 1 < kTaps; t += 2) {
       const std::int16_t* const at = triangles + t * step;
-      excess = hn::Add(excess, PairProducts(d32, every.Pairs(at, at + step), weight));
+      excess = hn::Add(excess, PairProducts(d32, half.Pairs(at, at + step),
+                                            half.Pair(-kTriangles, -kTriangles)));
     }
-    excess = hn::Add(excess, hn::ShiftLeft<3>(squares));
     return hn::Sub(excess, hn::Set(d32, kTriangles * kWindow * kTriangleMiddle));
   }
 };
 
-/// Both sides of the rule for any number of samples, as unsigned numbers of 32 bits.
-template <std::size_t kPhase, class V>
-HWY_INLINE void SmallSides(const EveryOther<kPhase>& every, V n, V distance, V sum,
-                           const std::int16_t* triangles, std::size_t taps, std::size_t step,
-                           hn::VFromD<decltype(every.du32)>& actual,
-                           hn::VFromD<decltype(every.du32)>& allowed) {
-  const auto& d = every.d;
-  const auto& d32 = every.d32;
-  const auto& du32 = every.du32;
+/// The sign of that for any number n of samples.
+template <std::size_t kTaps, class Half, class V>
+HWY_INLINE auto SignOfExcess(const Half& half, V n, V distance, V sum,
+                             const std::int16_t* triangles, std::size_t step) {
+  const auto& d = half.d;
+  const auto& d32 = half.d32;
+  const auto& du32 = half.du32;
   const V zero = hn::Zero(d);
+  const V one = hn::Set(d, 1);
   const auto wide = [&](V v) HWY_ATTR {
-    return hn::BitCast(du32, PairProducts(d32, every.Pairs(v, zero), hn::Set(d, 1)));
+    return hn::BitCast(du32, PairProducts(d32, half.Pairs(v, zero), one));
   };
   const auto square = [&](V v) HWY_ATTR {
-    return hn::BitCast(du32, PairProducts(d32, every.Pairs(v, zero), every.Pairs(v, zero)));
+    return hn::BitCast(du32, PairProducts(d32, half.Pairs(v, zero), half.Pairs(v, zero)));
   };
-  const auto window = static_cast<int>(taps * taps);
-  auto all = hn::Set(d32, window * kTriangleMiddle);
-  for (std::size_t t = 0; t + 1 < taps; t += 2) {
+  const V last = hn::LoadU(d, triangles + (kTaps - 1) * step);
+  auto all = hn::Add(PairProducts(d32, half.Pairs(zero, last), one),
+                     hn::Set(d32, static_cast<int>(kTaps * kTaps) * kTriangleMiddle));
+  for (std::size_t t = 0; t + 1 < kTaps; t += 2) {
     const std::int16_t* const at = triangles + t * step;
-    all = hn::Add(all, PairProducts(d32, every.Pairs(at, at + step), hn::Set(d, 1)));
+    all = hn::Add(all, PairProducts(d32, half.Pairs(at, at + step), one));
   }
-  all = hn::Add(all,
-                PairProducts(d32, every.Pairs(zero, triangles + (taps - 1) * step), hn::Set(d, 1)));
   const auto count = wide(n);
   const auto squares = hn::Add(hn::ShiftLeft<1>(hn::BitCast(du32, all)), wide(sum));
   const auto spread = hn::Sub(hn::Mul(count, squares), square(sum));
-  allowed = hn::Mul(hn::Mul(count, hn::Set(du32, 9)), spread);
-  actual = hn::Mul(hn::Sub(hn::ShiftLeft<2>(count), hn::Set(du32, 4)), square(distance));
+  const auto allowed = hn::Mul(hn::Mul(count, hn::Set(du32, 9)), spread);
+  const auto actual = hn::Mul(hn::Sub(hn::ShiftLeft<2>(count), hn::Set(du32, 4)), square(distance));
+  const auto sign = hn::IfThenElse(hn::RebindMask(d32, hn::Gt(actual, allowed)), hn::Set(d32, 1),
+                                   hn::Set(d32, -1));
+  return hn::IfThenElse(hn::RebindMask(d32, hn::Eq(actual, allowed)), hn::Zero(d32), sign);
 }
 
 /// Flags the samples that the definition calls noise. All numbers are exact, and the definition
 /// errs by far less than any two different sides are apart: only where they are equal it is asked
 /// itself.
-template <std::size_t kTaps>
+template <std::size_t kTaps, bool kHoles>
 HWY_ATTR void JudgeSmall(const SmallMoments& m, std::uint8_t* flags) {
   const hn::ScalableTag<std::int16_t> d;
-  const EveryOther<0> even;
-  const EveryOther<1> odd;
-  const hn::Rebind<std::int8_t, decltype(d)> d8;
+  const HalfBlocks<false> lower;
+  const HalfBlocks<true> upper;
+  const hn::Rebind<std::uint8_t, decltype(d)> d8;
   const auto middle = hn::Set(d, std::int16_t{kSmallMiddle});
   for (std::size_t i = 0; i < m.count; i += hn::Lanes(d)) {
+    auto sum = hn::LoadU(d, m.sums + i);
+    for (std::size_t t = 1; t < kTaps; ++t) {
+      sum = hn::Add(sum, hn::LoadU(d, m.sums + i + t * m.step));
+    }
     auto n = hn::Set(d, static_cast<std::int16_t>(kTaps * kTaps));
-    if (m.excluded != nullptr) {
+    if constexpr (kHoles) {
       n = hn::Sub(n, hn::LoadU(d, reinterpret_cast<const std::int16_t*>(m.excluded) + i));
     }
-    const auto sum = hn::LoadU(d, m.sums + i);
     const auto v = hn::Sub(LoadSamples(d, m.centre + i), middle);
     const auto distance = hn::Max(hn::Sub(hn::Mul(n, v), sum), hn::Zero(d));
     const std::int16_t* const triangles = m.triangles + i;
-    hn::Vec<decltype(d)> above;
-    hn::Vec<decltype(d)> equal;
-    const auto both = [&](auto evenMask, auto oddMask) HWY_ATTR {
-      return hn::OddEven(hn::BitCast(d, hn::VecFromMask(oddMask)),
-                         hn::BitCast(d, hn::VecFromMask(evenMask)));
+    const auto excess = [&](const auto& half) HWY_ATTR {
+      if constexpr (kHoles) {
+        return SignOfExcess<kTaps>(half, n, distance, sum, triangles, m.step);
+      } else {
+        return SmallRule<kTaps>::Excess(half, distance, sum, triangles, m.step);
+      }
     };
-    if (m.excluded == nullptr) {
-      const auto first = SmallRule<kTaps>::Excess(even, distance, sum, triangles, m.step);
-      const auto second = SmallRule<kTaps>::Excess(odd, distance, sum, triangles, m.step);
-      const auto zero = hn::Zero(even.d32);
-      above = both(hn::Gt(first, zero), hn::Gt(second, zero));
-      equal = both(hn::Eq(first, zero), hn::Eq(second, zero));
-    } else {
-      hn::VFromD<decltype(even.du32)> actual[2];
-      hn::VFromD<decltype(even.du32)> allowed[2];
-      SmallSides(even, n, distance, sum, triangles, kTaps, m.step, actual[0], allowed[0]);
-      SmallSides(odd, n, distance, sum, triangles, kTaps, m.step, actual[1], allowed[1]);
-      above = both(hn::Gt(actual[0], allowed[0]), hn::Gt(actual[1], allowed[1]));
-      equal = both(hn::Eq(actual[0], allowed[0]), hn::Eq(actual[1], allowed[1]));
-    }
-    hn::StoreU(hn::DemoteTo(d8, above), d8, reinterpret_cast<std::int8_t*>(flags) + i);
-    const auto doubtful = hn::And(hn::Ne(equal, hn::Zero(d)), hn::Gt(distance, hn::Zero(d)));
+    // (Saturation keeps signs and zeros.)
+    const auto signs = hn::ReorderDemote2To(d, excess(lower), excess(upper));
+    hn::StoreU(hn::DemoteTo(d8, signs), d8, flags + i);
+    const auto doubtful = hn::And(hn::Eq(signs, hn::Zero(d)), hn::Gt(distance, hn::Zero(d)));
     if (HWY_UNLIKELY(!hn::AllFalse(d, doubtful))) JudgeSmallOneByOne(m, i, hn::Lanes(d), flags);
   }
+}
+
+template <std::size_t kTaps>
+HWY_ATTR void JudgeSmall(const SmallMoments& m, std::uint8_t* flags) {
+  m.excluded == nullptr ? JudgeSmall<kTaps, false>(m, flags) : JudgeSmall<kTaps, true>(m, flags);
 }
 
 HWY_ATTR inline void JudgeSmall(const SmallMoments& m, std::uint8_t* flags) {
@@ -531,8 +524,8 @@ class NoiseStrip {
                                   CountExcluded(), plan_.Window(),          plan_.Outputs()};
     SumWindows();
     if constexpr (kSmall) {
-      JudgeSmall(SmallMoments{centre, moments.sums, Row(scratch_.squareColumns), moments.excluded,
-                              plan_.taps, plan_.channels, plan_.Outputs()},
+      JudgeSmall(SmallMoments{centre, Row<Sum>(scratch_.columns), Row(scratch_.squareColumns),
+                              moments.excluded, plan_.taps, plan_.channels, plan_.Outputs()},
                  scratch_.noise);
     } else if (plan_.compares) {
       if constexpr (std::is_same_v<T, std::uint8_t> || std::is_same_v<T, std::uint16_t>) {
@@ -568,13 +561,13 @@ class NoiseStrip {
   }
 
   HWY_ATTR void SumWindows() {
-    if (columnsReady_) {
+    if constexpr (kSmall) {
+      // (`JudgeSmall` takes the columns.)
+    } else if (columnsReady_) {
       WindowSums(Row<Sum>(scratch_.columns), plan_.taps, plan_.channels, plan_.Outputs(),
                  Row<Sum>(scratch_.levels), scratch_.pitch, Stores<Sum>{Row<Sum>(scratch_.sums)});
-      if constexpr (!kSmall) {
-        WindowSums(Row(scratch_.squareColumns), plan_.taps, plan_.channels, plan_.Outputs(),
-                   Row(scratch_.levels), scratch_.pitch, Stores<Acc>{Row(scratch_.squares)});
-      }
+      WindowSums(Row(scratch_.squareColumns), plan_.taps, plan_.channels, plan_.Outputs(),
+                 Row(scratch_.levels), scratch_.pitch, Stores<Acc>{Row(scratch_.squares)});
     } else if constexpr (std::is_same_v<Acc, double>) {
       for (std::size_t r = 0; r < plan_.taps; ++r) scratch_.ordered[r] = Window(r).samples;
       OrderedMoments(scratch_.ordered, plan_.taps, plan_.channels, plan_.Outputs(), scratch_.sums,
