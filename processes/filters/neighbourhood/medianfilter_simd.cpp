@@ -115,7 +115,6 @@ class MedianStrip {
     unsortedRows_ -= row.sortsBits ? 0 : 1;
     const T* const samples = strip_.WindowRow(y, row.ownSamples);
     const ExclusionTests<T> tests = strip_.Tests(y);
-    strip_.PrefetchRow(y + 1);
     row.dirty = tests.Any() && AnyExcluded(samples, plan_.Pixels(), plan_.channels, tests);
     row.excluded = row.dirty ? row.ownExcluded : scratch_.clean;
     if (row.dirty) FlagSamples(samples, plan_.Pixels(), plan_.channels, tests, row.ownExcluded);
@@ -148,7 +147,8 @@ class MedianStrip {
     }
     T* const output = strip_.Output(y);
     const bool inPlace = unsortedRows_ == 0 && !centre.dirty;
-    FindMedians(KeyWindows<Key>{rows, dirtyRows_ == 0 ? nullptr : excluded, plan_.taps,
+    const auto* const next = reinterpret_cast<const Key*>(strip_.InputWindowRow(y + half_ + 1));
+    FindMedians(KeyWindows<Key>{rows, dirtyRows_ == 0 ? nullptr : excluded, next, plan_.taps,
                                 plan_.channels, plan_.Outputs(), scratch_.windows,
                                 inPlace ? reinterpret_cast<Key*>(output) : scratch_.medians});
     if (inPlace) return;

@@ -16,6 +16,7 @@
 #define HWY_TARGET_INCLUDE "processes/filters/neighbourhood/windowmedians_simd.cpp"
 #include <hwy/foreach_target.h>
 // foreach_target.h must come first.
+#include <hwy/cache_control.h>
 #include <hwy/highway.h>
 
 #include "processes/filters/framework/sortingnetwork_simd.h"
@@ -287,6 +288,11 @@ HWY_ATTR void FindInRow(const KeyWindows<Key>& windows) {
   for (std::size_t first = 0; first < windows.count; first += kBlock) {
     const std::size_t count = std::min(kBlock, windows.count - first);
     const std::size_t length = count + (kTaps - 1) * windows.step;
+    // Results that are written in between keep the machine from looking ahead by itself, and a
+    // whole row at once would keep everything else waiting.
+    for (std::size_t i = 0; windows.next != nullptr && i < length; i += 64 / sizeof(Key)) {
+      hwy::Prefetch(windows.next + first + i);
+    }
     SortColumns<kHoles>(windows, first, length, rows, std::make_index_sequence<kTaps>());
     if constexpr (kTaps > 3) PairColumns(rows, length - windows.step);
     Key* const medians = windows.medians + first;

@@ -11,11 +11,12 @@ struct KeyWindows {
   const Key* const* rows;      ///< of the windows, from the top, starting at their left column
   const Key* const* excluded;  ///< beside them: all bits set where a key does not count, else 0;
                                ///< null where all count
-  std::size_t taps;            ///< side of the windows: 3, 5 or 7
-  std::size_t step;            ///< from one column to the next
-  std::size_t count;           ///< windows
-  Key* scratch;                ///< `MedianScratchKeys` elements
-  Key* medians;  ///< the `count` results, without padding; where nothing counts, anything
+  const Key* next;    ///< the row that enters them next, or null: it is asked for meanwhile
+  std::size_t taps;   ///< side of the windows: 3, 5 or 7
+  std::size_t step;   ///< from one column to the next
+  std::size_t count;  ///< windows
+  Key* scratch;       ///< `MedianScratchKeys` elements
+  Key* medians;       ///< the `count` results, without padding; where nothing counts, anything
 };
 
 /// Windows that share a pass over the scratch: so many bytes of keys stay in the nearest cache with

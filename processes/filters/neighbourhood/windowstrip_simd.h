@@ -40,12 +40,17 @@ class WindowStrip {
   const T* WindowRow(std::ptrdiff_t y, T* copy) const {
     return InputRow(firstColumn_ - job_.half, y, WindowPixels(), copy);
   }
+  /// Where they are in the input; null where there is no such row.
+  const T* InputWindowRow(std::ptrdiff_t y) const {
+    if (y >= job_.input.Height() + job_.input.MarginY()) return nullptr;
+    return job_.input.Pixel(firstColumn_ - job_.half, y);
+  }
   /// Asks for the memory of that row of input, if there is one: results that are written in between
   /// keep the machine from looking ahead by itself.
   void PrefetchRow(std::ptrdiff_t y) const {
-    if (y >= job_.input.Height() + job_.input.MarginY()) return;
     constexpr std::size_t kLine = 64 / sizeof(T);
-    const T* const row = job_.input.Pixel(firstColumn_ - job_.half, y);
+    const T* const row = InputWindowRow(y);
+    if (row == nullptr) return;
     for (std::size_t i = 0; i < WindowPixels() * channels_; i += kLine) hwy::Prefetch(row + i);
   }
   std::size_t WindowPixels() const { return width_ + 2 * static_cast<std::size_t>(job_.half); }
