@@ -76,11 +76,8 @@ class ValidityRow {
 
   void ClearNoData(const T* pixels, bool exact, std::uint8_t* valid, std::size_t count) const {
     if (input_.empty()) return;
-    for (std::size_t x = 0; x < count; ++x) {
-      const T* const pixel = pixels + x * channels_;
-      const bool isNoData = exact ? filters::PixelEquals(pixel, input_.data(), channels_)
-                                  : filters::PixelNearlyEquals(pixel, input_.data(), channels_);
-      if (isNoData) valid[x] = 0;
+    for (std::size_t x = 0; x < count; x += kStretch) {
+      ClearNoDataInStretch(pixels + x * channels_, exact, valid + x, std::min(kStretch, count - x));
     }
   }
 
@@ -102,6 +99,21 @@ class ValidityRow {
   }
 
  private:
+  // Pixels whose samples are looked at together.
+  static constexpr std::size_t kStretch = 256;
+
+  void ClearNoDataInStretch(const T* pixels, bool exact, std::uint8_t* valid,
+                            std::size_t count) const {
+    const bool equal = exact || std::is_integral_v<T>;
+    if (equal && !filters::AnySampleEquals(pixels, count * channels_, input_.front())) return;
+    for (std::size_t x = 0; x < count; ++x) {
+      const T* const pixel = pixels + x * channels_;
+      const bool isNoData = exact ? filters::PixelEquals(pixel, input_.data(), channels_)
+                                  : filters::PixelNearlyEquals(pixel, input_.data(), channels_);
+      if (isNoData) valid[x] = 0;
+    }
+  }
+
   void Translate(T* pixel) const { std::copy(output_.begin(), output_.end(), pixel); }
 
   std::size_t channels_;  ///< all parts of them
@@ -164,7 +176,7 @@ void BlockReader::Shape(const Window& window, WindowBuffers& buffers) const {
   buffers.alphas.Shape(width, height, source_.Alphas().size() * source_.Type().Bytes());
   buffers.fileMask.Shape(width, height, source_.Masks().empty() ? 0 : 1);
   buffers.valid.Shape(width, height, needsValid_ ? 1 : 0);
-  buffers.output.Shape(window.width, window.height, sampleBytes_);
+  buffers.output.Shape(window.width, window.height, request_.preparesOutput ? sampleBytes_ : 0);
   buffers.writable.Shape(window.width, window.height, needsWritable_ ? 1 : 0);
   buffers.labels.Shape(width, height, request_.labels != nullptr ? request_.labels->Bytes() : 0);
   if (request_.labels != nullptr) buffers.labelType = request_.labels->Type();
@@ -199,6 +211,8 @@ void BlockReader::Read(const Window& window, const WindowBuffers* above, WindowB
   ReadLabels(fresh, buffers.labels);
   MarkValid(fresh, buffers);
   MarkWritable(buffers);
+  const Plane& valid = buffers.valid;
+  buffers.masked = valid.Used() && std::memchr(valid.Data(), 0, valid.Size()) != nullptr;
   PrepareOutput(buffers);
 }
 
@@ -334,8 +348,8 @@ void BlockReader::MarkWritable(WindowBuffers& buffers) {
 }
 
 void BlockReader::PrepareOutput(WindowBuffers& buffers) const {
+  if (!buffers.output.Used()) return;
   const Plane& valid = buffers.valid;
-  buffers.masked = valid.Used() && std::memchr(valid.Data(), 0, valid.Size()) != nullptr;
   const bool noDataStays = !noData_.input.empty() && noData_.output.empty();
   for (std::int64_t y = 0; y < buffers.window.height; ++y) {
     const bool rowMasked =

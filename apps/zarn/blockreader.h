@@ -26,6 +26,8 @@ struct BlockRequest {
   bool exactNoData = false;
   /// The filter would write pixels that are not processed from their neighbours, and must not.
   bool protectsInvalid = false;
+  /// Windows are filtered into an output of their own size; without it `output` stays unused.
+  bool preparesOutput = true;
 };
 
 /// Reads windows with their halo and finds out which pixels are to be processed.
@@ -44,8 +46,8 @@ class BlockReader {
   /// Bytes of what is read and computed beside a pixel.
   std::size_t SideBytes() const;
 
-  /// Fills all planes of `buffers`. `above` holds the window above, where it is still in memory;
-  /// the rows that the two share are taken from there. Throws `RunError`.
+  /// Fills the planes of `buffers` that the request asks for. `above` holds the window above, where
+  /// it is still in memory; the rows that the two share are taken from there. Throws `RunError`.
   void Read(const Window& window, const WindowBuffers* above, WindowBuffers& buffers);
 
  private:

@@ -67,8 +67,9 @@ void Compare(const CompareOptions& options) {
   }
   const NoDataValues referenceNoData{NoDataOf(reference, "--src-nodata", options.srcNoData), {}};
   const NoDataValues inputNoData{NoDataOf(input, "--src-nodata", options.srcNoData), {}};
-  BlockReader referenceReader(reference, referenceNoData, {.marksNoData = true});
-  BlockReader inputReader(input, inputNoData, {.marksNoData = true});
+  BlockReader referenceReader(reference, referenceNoData,
+                              {.marksNoData = true, .preparesOutput = false});
+  BlockReader inputReader(input, inputNoData, {.marksNoData = true, .preparesOutput = false});
   const std::size_t channels = reference.Channels().size();
   std::vector<Differences> bands(channels);
   std::int64_t common = 0;

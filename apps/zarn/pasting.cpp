@@ -55,7 +55,7 @@ class Paster {
         source_(pasting.source),
         mosaic_(mosaic),
         map_(map),
-        reader_(source_, unused_, {.mask = pasting.mask}),
+        reader_(source_, unused_, {.mask = pasting.mask, .preparesOutput = false}),
         filter_(MakeFilter(pasting)) {
     filter_->SetNoDataValues(&pasting.sourceNoData, &pasting.mosaicNoData);
     filter_->SetStopOnNodata(pasting.stopOnNoData);

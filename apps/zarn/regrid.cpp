@@ -98,7 +98,9 @@ void RunRegridding(const ImageFilterOptions& options,
   StagedOutput output(options.output, source, noData.output,
                       regridding.grid ? &*regridding.grid : nullptr,
                       NeedsMask(source, noData.output));
-  BlockReader reader(source, noData, {.mask = mask ? &*mask : nullptr, .marksNoData = true});
+  BlockReader reader(
+      source, noData,
+      {.mask = mask ? &*mask : nullptr, .marksNoData = true, .preparesOutput = false});
   BlockWriter writer(source, output.Dataset(), output.Name());
   int blockWidth = 1;
   int blockHeight = 1;

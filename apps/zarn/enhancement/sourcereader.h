@@ -22,7 +22,8 @@ class SourceReader : public datasources::IRasterReader {
  public:
   /// All are borrowed; `mask` may be null.
   SourceReader(const RasterSource& source, const NoDataValues& noData, MaskFile* mask)
-      : source_(source), reader_(source, noData, {.mask = mask, .marksNoData = true}) {}
+      : source_(source),
+        reader_(source, noData, {.mask = mask, .marksNoData = true, .preparesOutput = false}) {}
 
   std::uint32_t Width() const override { return static_cast<std::uint32_t>(source_.Width()); }
   std::uint32_t Height() const override { return static_cast<std::uint32_t>(source_.Height()); }

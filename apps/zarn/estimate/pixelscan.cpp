@@ -67,7 +67,7 @@ void VisitRows(const WindowBuffers& buffers, std::size_t channels, const std::ve
 void ScanPixels(const RasterSource& source, const NoDataValues& noData, const Window& area,
                 nspio::Counter& progress, const std::function<void(const PixelRun&)>& visit) {
   const Window whole = WithWholeBlocks(source, area);
-  BlockReader reader(source, noData, {});
+  BlockReader reader(source, noData, {.preparesOutput = false});
   const WindowPlan plan({.image = {whole.width, whole.height},
                          .outputBlock = {source.BlockWidth(), source.BlockHeight()},
                          .halo = 0,

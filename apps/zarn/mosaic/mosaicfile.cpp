@@ -100,7 +100,7 @@ void MosaicFile::Publish(nspio::Counter& progress) {
 void ReadTile(const RasterSource& image, GDALDataset* map, const Window& window,
               TileBuffers& tile) {
   static const NoDataValues kNone;
-  BlockReader reader(image, kNone, {});
+  BlockReader reader(image, kNone, {.preparesOutput = false});
   const Window all{0, 0, window.width, window.height};
   reader.Read(all, nullptr, tile.image);
   std::swap(tile.image.samples, tile.image.output);

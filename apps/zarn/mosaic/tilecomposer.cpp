@@ -113,24 +113,49 @@ TileComposer::Overlay& TileComposer::OverlayOf(std::size_t scene) {
 void TileComposer::Paste(std::size_t scene, GridMover::Slot& pixels, TileBuffers& tile) {
   Overlay& overlay = OverlayOf(scene);
   if (plan_.stopsOnNoData) RequireData(scene, pixels);
+  // All that is without data is 0. Where nothing else is, one pass does for both.
+  const std::vector<double> empty(channels_, 0.0);
+  Select(true, pixels, tile);
+  if (SelectionLooksEmpty(tile, pixels.result.window)) {
+    Apply(overlay, scene, pixels, tile, selected_, {});
+    Select(false, pixels, tile);
+    Apply(overlay, scene, pixels, tile, selected_, empty);
+  } else {
+    Apply(overlay, scene, pixels, tile, pixels.covered, empty);
+  }
+  if (plan_.fillsGaps) KeepSpare(scene, pixels, tile);
+}
+
+void TileComposer::Select(bool withData, const GridMover::Slot& pixels, TileBuffers& tile) {
   const Window& window = pixels.result.window;
-  onData_.Shape(window.width, window.height, 1);
-  onEmpty_.Shape(window.width, window.height, 1);
-  const std::uint8_t* const covered = Bytes(std::as_const(pixels.covered));
+  selected_.Shape(window.width, window.height, 1);
+  const std::uint8_t* const covered = Bytes(pixels.covered);
   VisitMap(mapType_, tile.map, [&](const auto* numbers) {
     numbers += (window.y - tile.image.window.y) * window.width;
-    std::uint8_t* const onData = Bytes(onData_);
-    std::uint8_t* const onEmpty = Bytes(onEmpty_);
-    for (std::size_t i = 0; i < onData_.Size(); ++i) {
-      const bool empty = numbers[i] == 0;
-      onData[i] = empty ? std::uint8_t{0} : covered[i];
-      onEmpty[i] = empty ? covered[i] : std::uint8_t{0};
+    std::uint8_t* const selected = Bytes(selected_);
+    const std::size_t count = selected_.Size();
+    for (std::size_t i = 0; i < count; ++i) {
+      selected[i] = (numbers[i] != 0) == withData ? covered[i] : std::uint8_t{0};
     }
   });
-  Apply(overlay, scene, pixels, tile, onData_, {});
-  // All that is without data is 0.
-  Apply(overlay, scene, pixels, tile, onEmpty_, std::vector<double>(channels_, 0.0));
-  if (plan_.fillsGaps) KeepSpare(scene, pixels, tile);
+}
+
+// Whether a pixel of the tile that is selected is 0.
+bool TileComposer::SelectionLooksEmpty(const TileBuffers& tile, const Window& window) const {
+  const std::byte* const selected = selected_.Data();
+  const std::size_t count = selected_.Size();
+  if (std::memchr(selected, 1, count) == nullptr) return false;
+  bool any = false;
+  VisitAnySampleType(type_.code, [&]<typename T>(std::type_identity<T>, std::size_t parts) {
+    const std::vector<T> zeros(channels_ * parts, T{0});
+    const T* const pixels =
+        reinterpret_cast<const T*>(tile.image.output.At(0, window.y - tile.image.window.y));
+    for (std::size_t i = 0; i < count && !any; ++i) {
+      any = selected[i] != std::byte{0} &&
+            filters::PixelNearlyEquals(pixels + i * zeros.size(), zeros.data(), zeros.size());
+    }
+  });
+  return any;
 }
 
 void TileComposer::Apply(Overlay& overlay, std::size_t scene, GridMover::Slot& pixels,
@@ -224,14 +249,27 @@ void TileComposer::SettleNoData(TileBuffers& tile) const {
   VisitAnySampleType(type_.code, [&]<typename T>(std::type_identity<T>, std::size_t parts) {
     const NoDataPixel<T> noData(plan_.noData, parts);
     const std::size_t samples = noData.samples.size();
-    T* pixel = reinterpret_cast<T*>(tile.image.output.Data());
+    T* const pixels = reinterpret_cast<T*>(tile.image.output.Data());
     VisitMap(mapType_, tile.map, [&]<typename N>(const N* numbers) {
+      const auto settle = [&](std::size_t begin, std::size_t end) {
+        for (std::size_t i = begin; i < end; ++i) {
+          T* const pixel = pixels + i * samples;
+          if (numbers[i] == 0) {
+            std::copy(noData.samples.begin(), noData.samples.end(), pixel);
+          } else if (filters::PixelEquals(pixel, noData.samples.data(), samples)) {
+            *pixel = noData.replacement;
+          }
+        }
+      };
+      // Most stretches have data everywhere, and none that looks like no-data.
+      constexpr std::size_t kStretch = 256;
       const std::size_t count = tile.map.Size() / sizeof(N);
-      for (std::size_t i = 0; i < count; ++i, pixel += samples) {
-        if (numbers[i] == 0) {
-          std::copy(noData.samples.begin(), noData.samples.end(), pixel);
-        } else if (filters::PixelEquals(pixel, noData.samples.data(), samples)) {
-          *pixel = noData.replacement;
+      for (std::size_t begin = 0; begin < count; begin += kStretch) {
+        const std::size_t size = std::min(kStretch, count - begin);
+        if (filters::AnySampleEquals(numbers + begin, size, N{0}) ||
+            filters::AnySampleEquals(pixels + begin * samples, size * samples,
+                                     noData.samples.front())) {
+          settle(begin, begin + size);
         }
       }
     });

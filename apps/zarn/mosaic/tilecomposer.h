@@ -43,6 +43,8 @@ class TileComposer {
   using Overlay = processes::filters::CutlineBlendingBase;
 
   Overlay& OverlayOf(std::size_t scene);
+  void Select(bool withData, const GridMover::Slot& pixels, TileBuffers& tile);
+  bool SelectionLooksEmpty(const TileBuffers& tile, const Window& window) const;
   void Apply(Overlay& overlay, std::size_t scene, GridMover::Slot& pixels, TileBuffers& tile,
              const Plane& mask, const std::vector<double>& mosaicNoData) const;
   void RequireData(std::size_t scene, const GridMover::Slot& pixels);
@@ -58,8 +60,7 @@ class TileComposer {
   bool writesMask_;
   SampleType mapType_;
   std::map<std::size_t, std::unique_ptr<Overlay>> overlays_;
-  Plane onData_;   ///< pixels to mix
-  Plane onEmpty_;  ///< pixels to fill
+  Plane selected_;  ///< covered pixels to mix, or those to fill
   Plane inside_;
 };
 

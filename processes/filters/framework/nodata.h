@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cmath>
 #include <cstddef>
+#include <cstdint>
 #include <limits>
 #include <type_traits>
 #include <vector>
@@ -36,6 +37,15 @@ bool PixelEquals(const T* pixel, const T* value, std::size_t channels) {
     if (!(pixel[c] == value[c])) return false;
   }
   return true;
+}
+
+/// Whether any of some samples equals a value. Where none does, no pixel among them equals one that
+/// has this value in a channel, which is quickly told.
+template <typename T>
+bool AnySampleEquals(const T* samples, std::size_t count, T value) {
+  std::uint8_t any = 0;
+  for (std::size_t i = 0; i < count; ++i) any |= static_cast<std::uint8_t>(samples[i] == value);
+  return any != 0;
 }
 
 /// Differences below this do not tell a floating sample from a no-data value.
