@@ -64,7 +64,7 @@ void Interpolation::Enter(const Window& window) {
 
 Window Interpolation::SourceOf(const Window& part) const {
   // Cubic convolution draws on two pixels to either side of a position.
-  constexpr double kReach = 2.0;
+  const double reach = method_ == ResampleMethod::kNearest ? 0.0 : 2.0;
   double left = width_;
   double right = 0;
   double top = height_;
@@ -80,10 +80,10 @@ Window Interpolation::SourceOf(const Window& part) const {
     }
   }
   if (left > right) return {};
-  const auto x = static_cast<std::int64_t>(std::max(left - kReach, 0.0));
-  const auto y = static_cast<std::int64_t>(std::max(top - kReach, 0.0));
-  return {x, y, static_cast<std::int64_t>(std::min(right + kReach + 1, width_)) - x,
-          static_cast<std::int64_t>(std::min(bottom + kReach + 1, height_)) - y};
+  const auto x = static_cast<std::int64_t>(std::max(left - reach, 0.0));
+  const auto y = static_cast<std::int64_t>(std::max(top - reach, 0.0));
+  return {x, y, static_cast<std::int64_t>(std::min(right + reach + 1, width_)) - x,
+          static_cast<std::int64_t>(std::min(bottom + reach + 1, height_)) - y};
 }
 
 void Interpolation::Move(const gobs::Raster& source, const std::uint8_t* mask,

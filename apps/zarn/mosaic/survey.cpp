@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "apps/zarn/mosaic/survey.h"
 
+#include <cpl_conv.h>
+
 #include <algorithm>
 #include <array>
 #include <atomic>
@@ -21,17 +23,36 @@ namespace zarn::app {
 namespace {
 
 constexpr std::int64_t kMostCells = std::int64_t{1} << 22;
+// Pixels of a scene to read at a time at most; more would only cost memory.
+constexpr std::int64_t kPiece = std::int64_t{1} << 21;
 // Error of a position that does not matter here, in pixels of a scene.
 constexpr double kThreshold = 0.5;
 
 std::int64_t DivideUp(std::int64_t a, std::int64_t b) { return (a + b - 1) / b; }
+
+int ThreadsOf(const WorkOptions& work) {
+  return work.threads > 0 ? work.threads : sys::OMPGetMaxThreads();
+}
+
+// Where the lattice lies along the rows of a scene, those between its own need neither be copied
+// nor looked at, nor decoded if each is on its own. The blocks stay in GDAL's cache meanwhile.
+std::int64_t PixelsAtATime(const ScenePlan& scene, const Survey& survey, const WorkOptions& work) {
+  const RasterSource source(scene.File());
+  const std::int64_t blockRow = std::int64_t{source.Width()} * source.BlockHeight() *
+                                source.Dataset().GetRasterCount() *
+                                static_cast<std::int64_t>(source.Type().Bytes());
+  if (scene.place && blockRow * ThreadsOf(work) < GDALGetCacheMax64() / 2) {
+    return scene.covers.width + 2 * survey.step;
+  }
+  return std::min(kPiece, MostSourcePixels(survey.channels * survey.type.Bytes(), work));
+}
 
 SurveyedScene SurveyScene(const ScenePlan& scene, const Survey& survey, const WorkOptions& work) {
   FeedRequest request;
   request.grid = survey.lattice;
   request.resampling = "nearest";
   request.threshold = kThreshold;
-  request.mostSourcePixels = MostSourcePixels(survey.channels * survey.type.Bytes(), work);
+  request.mostSourcePixels = PixelsAtATime(scene, survey, work);
   request.isMosaic = false;
   SceneFeed feed(scene, request);
   SurveyedScene result{scene.File(), CellsOf(survey, scene.covers), {}, {}};
@@ -108,7 +129,12 @@ void TakeSurvey(const std::vector<ScenePlan>& scenes, const WorkOptions& work, S
   std::size_t done = 0;
   std::exception_ptr failure;
   std::mutex mutex;
+  const int threads = ThreadsOf(work);
+  // Scenes side by side need fewer threads to decode each; a handle for every block costs too.
+  const auto readers = std::min(static_cast<std::size_t>(threads), scenes.size());
+  const std::string decoders = std::to_string(DivideUp(threads, static_cast<int>(readers)));
   const auto takeTurns = [&] {
+    const CPLConfigOptionSetter decode("GDAL_NUM_THREADS", decoders.c_str(), false);
     for (std::size_t i = next++; i < scenes.size(); i = next++) {
       try {
         survey.scenes[before + i] = SurveyScene(scenes[i], survey, work);
@@ -122,10 +148,9 @@ void TakeSurvey(const std::vector<ScenePlan>& scenes, const WorkOptions& work, S
       }
     }
   };
-  const int threads = work.threads > 0 ? work.threads : sys::OMPGetMaxThreads();
   {
     std::vector<std::jthread> helpers;
-    for (int i = 1; i < threads; ++i) helpers.emplace_back(takeTurns);
+    for (std::size_t i = 1; i < readers; ++i) helpers.emplace_back(takeTurns);
     takeTurns();
   }
   if (failure) std::rethrow_exception(failure);
