@@ -95,7 +95,13 @@ void GridDodgingSurface::GetBilinearRun(unsigned column, unsigned row, unsigned 
   const std::size_t rowPitch = grid_.columns * channels;
   const float* const upper = grid_.values.data() + y.node * rowPitch;
   const float* const lower = grid_.rows > 1 ? upper + rowPitch : upper;
-  const std::size_t right = grid_.columns > 1 ? channels : 0;
+  if (grid_.columns == 1) {
+    for (std::size_t c = 0; c < channels; ++c) {
+      const auto value = static_cast<float>(Between(upper[c], lower[c], y.fraction));
+      std::fill_n(values + c * pitch, count, value);
+    }
+    return;
+  }
   // All pixels between the same two columns of nodes share the interpolations along these.
   for (unsigned k = 0; k < count;) {
     const std::size_t node = PlaceOf(column + k, x.origin, x.step, grid_.columns).node;
@@ -105,7 +111,7 @@ void GridDodgingSurface::GetBilinearRun(unsigned column, unsigned row, unsigned 
     for (std::size_t c = 0; c < channels; ++c) {
       const std::size_t i = node * channels + c;
       const double a = Between(upper[i], lower[i], y.fraction);
-      const double b = Between(upper[i + right], lower[i + right], y.fraction);
+      const double b = Between(upper[i + channels], lower[i + channels], y.fraction);
       FillCell(fractions, end - k, a, b, values + c * pitch + k);
     }
     k = end;
@@ -116,12 +122,15 @@ void GridDodgingSurface::GetBilinearRun(unsigned column, unsigned row, unsigned 
 // cell once they have left one.
 unsigned GridDodgingSurface::EndOfCell(unsigned column, unsigned k, unsigned count,
                                        std::size_t node) const {
+  const auto holds = [&](unsigned pixel) {
+    return PlaceOf(column + pixel, grid_.originX, grid_.stepX, grid_.columns).node == node;
+  };
+  if (holds(count - 1)) return count;
   unsigned inside = k;
-  unsigned outside = count;
+  unsigned outside = count - 1;
   while (outside - inside > 1) {
     const unsigned middle = inside + (outside - inside) / 2;
-    const Place place = PlaceOf(column + middle, grid_.originX, grid_.stepX, grid_.columns);
-    (place.node == node ? inside : outside) = middle;
+    (holds(middle) ? inside : outside) = middle;
   }
   return outside;
 }

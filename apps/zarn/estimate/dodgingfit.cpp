@@ -5,6 +5,7 @@
 #include <cmath>
 
 #include "apps/zarn/estimate/differencesystem.h"
+#include "host/sys/parallel.h"
 
 namespace zarn::app {
 namespace {
@@ -16,19 +17,58 @@ constexpr double kOffsetTie = 0.05;
 constexpr std::size_t kLeastCells = 12;
 
 struct Node {
+  std::size_t cells = 0;
   std::vector<Moments>
       moments;  // per channel, x the reference; empty where there are too few cells
 };
 
-std::vector<CellPair> CellsAround(const std::vector<CellPair>& cells, const Ground& ground,
-                                  const DodgingGrid& grid, unsigned column, unsigned row) {
+struct Position {
+  double x;
+  double y;
+};
+
+/// The common cells, and where they lie in pixels from the first node.
+struct PlacedCells {
+  PlacedCells(const std::vector<CellPair>& all, const Ground& ground, const DodgingGrid& grid)
+      : cells(all) {
+    positions.reserve(all.size());
+    for (const CellPair& cell : all) {
+      positions.push_back({ground.Column(cell.x, cell.y) - 0.5 - grid.originX,
+                           ground.Row(cell.x, cell.y) - 0.5 - grid.originY});
+    }
+  }
+
+  const std::vector<CellPair>& cells;
+  std::vector<Position> positions;
+};
+
+std::vector<CellPair> CellsAround(const PlacedCells& placed, const DodgingGrid& grid,
+                                  std::size_t node) {
+  const auto column = static_cast<double>(node % grid.columns);
+  const auto row = static_cast<double>(node / grid.columns);
   std::vector<CellPair> near;
-  for (const CellPair& cell : cells) {
-    const double dx = ground.Column(cell.x, cell.y) - 0.5 - grid.originX - column * grid.stepX;
-    const double dy = ground.Row(cell.x, cell.y) - 0.5 - grid.originY - row * grid.stepY;
-    if (std::abs(dx) <= grid.stepX && std::abs(dy) <= grid.stepY) near.push_back(cell);
+  for (std::size_t i = 0; i < placed.cells.size(); ++i) {
+    const double dx = placed.positions[i].x - column * grid.stepX;
+    const double dy = placed.positions[i].y - row * grid.stepY;
+    if (std::abs(dx) <= grid.stepX && std::abs(dy) <= grid.stepY) near.push_back(placed.cells[i]);
   }
   return near;
+}
+
+std::vector<Node> MeasureNodes(const PlacedCells& placed, const DodgingGrid& grid) {
+  namespace parallel = sys::parallel;
+  std::vector<Node> nodes(std::size_t{grid.columns} * grid.rows);
+  const auto count = static_cast<std::ptrdiff_t>(nodes.size());
+  parallel::ForEachRowBandRethrowing(
+      count, parallel::BandCount(count),
+      [&](std::ptrdiff_t, std::ptrdiff_t begin, std::ptrdiff_t end) {
+        for (auto n = static_cast<std::size_t>(begin); n < static_cast<std::size_t>(end); ++n) {
+          const std::vector<CellPair> near = CellsAround(placed, grid, n);
+          nodes[n].cells = near.size();
+          if (near.size() >= kLeastCells) nodes[n].moments = RobustMoments(near, grid.channels);
+        }
+      });
+  return nodes;
 }
 
 // The values at all nodes, from targets with weights and ties between neighbours.
@@ -84,16 +124,9 @@ DodgingGrid LayGrid(const WindowSize& image, std::size_t channels, int nodes) {
 DodgingFit FitDodging(const std::vector<CellPair>& cells, const Ground& ground,
                       const DodgingGrid& grid, const GainLimits& limits) {
   DodgingFit fit{{}, grid, grid};
-  std::vector<Node> nodes;
+  const std::vector<Node> nodes = MeasureNodes(PlacedCells(cells, ground, grid), grid);
   double meanCells = 0;
-  for (unsigned row = 0; row < grid.rows; ++row) {
-    for (unsigned column = 0; column < grid.columns; ++column) {
-      const std::vector<CellPair> near = CellsAround(cells, ground, grid, column, row);
-      nodes.emplace_back();
-      if (near.size() >= kLeastCells) nodes.back().moments = RobustMoments(near, grid.channels);
-      meanCells += static_cast<double>(near.size());
-    }
-  }
+  for (const Node& node : nodes) meanCells += static_cast<double>(node.cells);
   meanCells /= static_cast<double>(nodes.size());
 
   for (std::size_t c = 0; c < grid.channels; ++c) {

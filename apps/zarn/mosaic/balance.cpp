@@ -315,13 +315,15 @@ class Network {
     const std::size_t channels = dodging.pivots.size();
     for (std::size_t i = 0; i < dodging.offsets.values.size(); ++i) {
       const std::size_t c = i % channels;
-      const double gain = before.gains[c];
       const double pivot = dodging.pivots[c];
-      const double offset = pivot * gain - pivot + before.offsets[c];
-      dodging.gains.values[i] = static_cast<float>(gain);
+      const double offset = pivot * before.gains[c] - pivot + before.offsets[c];
       dodging.offsets.values[i] =
           static_cast<float>(offset + static_cast<double>(dodging.offsets.values[i]));
     }
+    // A gain that is the same everywhere is a surface of one node.
+    dodging.gains.columns = 1;
+    dodging.gains.rows = 1;
+    dodging.gains.values.assign(before.gains.begin(), before.gains.end());
   }
 
   const Survey& survey_;

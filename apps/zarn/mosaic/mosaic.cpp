@@ -290,8 +290,8 @@ void AddMosaicCommand(CLI::App& app) {
   });
   command.footer(
       "Scenes are read in windows (twice where colours or seams depend on all of them), freed of "
-      "its hot spot, brought onto the grid of OUT, "
-      "balanced and pasted along its cutline. Pixels that are no-data, NaN, transparent (alpha 0) "
+      "their hot spots, brought onto the grid of OUT, balanced and pasted along their cutlines. "
+      "Pixels that are no-data, NaN, transparent (alpha 0) "
       "or masked take no part, and no pixel with data becomes no-data. Without --cutlines seams "
       "follow the least visible way through each overlap. The result depends neither on --threads "
       "nor on --memory, nor on how a plan is cut into pieces.\n\n"

@@ -24,6 +24,7 @@
 #include "apps/zarn/progress.h"
 #include "apps/zarn/sourcelocator.h"
 #include "apps/zarn/windowgeometry.h"
+#include "host/sys/openmp.h"
 #include "processes/filters/factories/cutlineblendingfactory.h"
 
 namespace zarn::app {
@@ -89,6 +90,8 @@ class Planner {
       : options_(options), progress_(progress) {}
 
   Planning Make() {
+    const sys::OMPThreadCount threads(options_.work.threads > 0 ? options_.work.threads
+                                                                : sys::OMPGetMaxThreads());
     CheckOptions();
     OpenScenes();
     LayGrid();
