@@ -6,6 +6,8 @@
 #include <mutex>
 #include <thread>
 
+#include "host/sys/openmp.h"
+
 namespace zarn::app {
 namespace {
 
@@ -67,6 +69,7 @@ class Conveyor {
 void RunPipeline(std::size_t jobs, std::size_t slots, const std::vector<Stage>& stages,
                  std::size_t callersStage) {
   Conveyor conveyor(jobs, slots, stages);
+  const sys::OMPBriefWaits briefWaits;
   {
     std::vector<std::jthread> threads;
     for (std::size_t stage = 0; stage < stages.size(); ++stage) {

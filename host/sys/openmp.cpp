@@ -4,6 +4,12 @@
 #include <omp.h>
 
 #include <algorithm>
+#include <atomic>
+#include <condition_variable>
+#include <mutex>
+#include <stop_token>
+
+#include "host/sys/parallel.h"
 
 namespace zarn::sys {
 
@@ -24,5 +30,17 @@ OMPThreadCount::OMPThreadCount(std::int64_t count) : previous_(omp_get_max_threa
 }
 
 OMPThreadCount::~OMPThreadCount() { omp_set_num_threads(previous_); }
+
+OMPBriefWaits::OMPBriefWaits()
+    : idle_([](const std::stop_token& stop) {
+        constexpr int kTeam = 2;
+        const OMPThreadCount threads(kTeam);
+        std::atomic<int> started{0};
+        parallel::ForEachRowBand(kTeam, kTeam, [&](auto, auto, auto) { ++started; });
+        std::mutex mutex;
+        std::unique_lock lock(mutex);
+        std::condition_variable_any never;
+        never.wait(lock, stop, [] { return false; });
+      }) {}
 
 }  // namespace zarn::sys

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <thread>
 
 #include "host/hostexport.h"
 
@@ -37,6 +38,19 @@ class ZARN_HOST_EXPORT OMPThreadCount {
 
  private:
   int previous_;
+};
+
+/// Lets threads that wait for the next parallel region give up their processors soon, for its
+/// lifetime: for a program whose other threads have work for them.
+///
+/// GNU's run-time lets them spin for milliseconds, except where it manages more threads than there
+/// are processors. So this adds two, which do nothing.
+class ZARN_HOST_EXPORT OMPBriefWaits {
+ public:
+  OMPBriefWaits();
+
+ private:
+  std::jthread idle_;
 };
 
 }  // namespace zarn::sys
