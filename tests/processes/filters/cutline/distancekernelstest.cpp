@@ -68,7 +68,7 @@ TEST_P(DistanceKernels, GiveTheBitsOfTheDefinition) {
     const bool isShared = std::ranges::all_of(
         edges, [&](const PolygonEdge& edge) { return edge.firstBand <= at.row; });
     if (isShared && edges.size() > 1) {
-      GroupedEdges grouped(edges.size() + 2);
+      GroupedEdges grouped(GroupedEdges::kPart + GroupedEdges::PlacesFor(edges.size()));
       NearEdges inParts = near;
       inParts.grouped = &grouped;
       inParts.place = GroupedEdges::kPart * random.Below(2);
