@@ -7,11 +7,11 @@
 #include <filesystem>
 #include <map>
 #include <set>
+#include <utility>
 
 #include "apps/zarn/cutlinefile.h"
 #include "apps/zarn/errors.h"
 #include "apps/zarn/gdalruntime.h"
-#include "apps/zarn/windowgeometry.h"
 
 namespace zarn::app {
 namespace {
@@ -60,6 +60,41 @@ Polygon PolygonOf(const processes::filters::PolygonParam& param) {
   return polygon;
 }
 
+// Whether a polygon has to do with the pixels of a window: one of its edges runs through them, or
+// they lie inside altogether.
+bool Reaches(const Polygon& polygon, const Window& window) {
+  // Edges that run along the border from outside do not count.
+  constexpr double kInset = 0.25;
+  const double left = static_cast<double>(window.x) + kInset;
+  const double top = static_cast<double>(window.y) + kInset;
+  const double right = static_cast<double>(window.x + window.width) - kInset;
+  const double bottom = static_cast<double>(window.y + window.height) - kInset;
+  OGRLinearRing border;
+  for (const auto& [x, y] : {std::pair{left, top}, {right, top}, {right, bottom}, {left, bottom}}) {
+    border.addPoint(x, y);
+  }
+  border.closeRings();
+  OGRPolygon pixels;
+  pixels.addRing(&border);
+  const OGRPoint corner(left, top);
+  bool inside = false;
+  for (std::size_t i = 0; i < polygon.starts.size(); ++i) {
+    const auto begin = static_cast<std::size_t>(polygon.starts[i]);
+    const std::size_t end = i + 1 < polygon.starts.size()
+                                ? static_cast<std::size_t>(polygon.starts[i + 1])
+                                : polygon.vertices.size() / 2;
+    OGRLinearRing ring;
+    for (std::size_t k = begin; k < end; ++k) {
+      ring.addPoint(polygon.vertices[2 * k], polygon.vertices[2 * k + 1]);
+    }
+    ring.closeRings();
+    const OGRLineString edges(ring);
+    if (edges.Intersects(&pixels) != FALSE) return true;
+    inside ^= ring.isPointInRing(&corner) != FALSE;
+  }
+  return inside;
+}
+
 [[noreturn]] void RefuseShared(const std::string& file, const std::string& name,
                                const std::string& one, const std::string& other) {
   throw RunError("the cutline '" + name + "' in " + file + " may be that of " + one + " or of " +
@@ -95,13 +130,12 @@ void AssignCutlines(const std::string& file, const std::string& field, const Ras
       RefuseMissing(file, key, scene);
     }
     const RasterPolygon polygon = LoadCutline({.file = file, .layer = {}, .where = where}, mosaic);
-    if (!partial &&
-        !Meet(polygon.PixelsWithin({mosaic.Width(), mosaic.Height()}, 0), scene.covers)) {
+    scene.cutline = PolygonOf(polygon.Param());
+    if (!partial && !Reaches(scene.cutline, scene.covers)) {
       throw RunError("the cutline of " + scene.File() + " in " + file +
                      " misses it; compare their extents with gdalinfo and ogrinfo, or leave the "
                      "scene out");
     }
-    scene.cutline = PolygonOf(polygon.Param());
   }
 }
 

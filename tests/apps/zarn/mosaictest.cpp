@@ -411,6 +411,9 @@ TEST_F(Mosaicking, RefusesWhatCannotWorkBeforeItBegins) {
   Write(scenes[1].image, folder_ / "far.tif", {}, Georeference(5000, 0, kNoData));
   WriteFeatures({{OnMap({Rectangle(900, 900, 950, 950)}), "west"}, {OnMap(East()), "east"}},
                 folder_ / "missing.gpkg", "GPKG", 32633, "scene");
+  // Around the scene, but not on it.
+  const Polygon around{Rectangle(-50, -50, 400, 400), Rectangle(-20, -20, 350, 350)};
+  WriteFeatures({{OnMap(around), "west"}}, folder_ / "around.gpkg", "GPKG", 32633, "scene");
   struct Case {
     Arguments arguments;
     int status;
@@ -428,6 +431,7 @@ TEST_F(Mosaicking, RefusesWhatCannotWorkBeforeItBegins) {
       {{files_[0], files_[1], out, "--cutlines", folder_ / "missing.gpkg"}, 1, "west.tif in "},
       {{files_[0], files_[2], out, "--cutlines", folder_ / "missing.gpkg"}, 1, "misses it"},
       {{files_[2], out, "--cutlines", folder_ / "missing.gpkg"}, 1, "has no cutline for"},
+      {{files_[0], out, "--cutlines", folder_ / "around.gpkg"}, 1, "misses it"},
       {{files_[0], out, "--cutlines", cutlines, "--cutline-id", "fid2"}, 2, "has no field 'fid2'"},
       {{files_[0], out, "--stop-on-nodata"}, 2, "needs --cutlines"},
       {{files_[0], files_[1], out, "--feather", "3", "--seams", "none"}, 2, "no cutlines"},
