@@ -88,7 +88,8 @@ bool Reaches(const Polygon& polygon, const Window& window) {
       ring.addPoint(polygon.vertices[2 * k], polygon.vertices[2 * k + 1]);
     }
     ring.closeRings();
-    const OGRLineString edges(ring);
+    OGRLineString edges;
+    edges.addSubLineString(&ring);
     if (edges.Intersects(&pixels) != FALSE) return true;
     inside ^= ring.isPointInRing(&corner) != FALSE;
   }

@@ -42,7 +42,7 @@ std::int64_t PixelsAtATime(const ScenePlan& scene, const Survey& survey, const W
                                 source.Dataset().GetRasterCount() *
                                 static_cast<std::int64_t>(source.Type().Bytes());
   if (scene.place && blockRow * ThreadsOf(work) < GDALGetCacheMax64() / 2) {
-    return scene.covers.width + 2 * survey.step;
+    return scene.covers.width + std::int64_t{2} * survey.step;
   }
   return std::min(kPiece, MostSourcePixels(survey.channels * survey.type.Bytes(), work));
 }
