@@ -158,8 +158,7 @@ void RunImageFilter(const ImageFilterOptions& options, const FilterMaker& maker)
 
   // First, because fitting may read the whole image.
   StagedOutput output(options.output, source, noData.output);
-  const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
-                                                        : sys::OMPGetMaxThreads());
+  const sys::OMPThreadCount threads(sys::OMPThreadsFor(options.threads));
   TerminalProgress progress(options.quiet);
   const double filtered = output.CopiesAtTheEnd() ? 0.5 : 0.99;
   ProgressSpan fitting(progress, 0, maker.fittingShare * filtered);

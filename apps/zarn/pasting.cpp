@@ -312,7 +312,7 @@ void Paste(const Pasting& pasting, const WorkOptions& work, bool checkFirst, Upd
        .forced = ParseWindow(work.window),
        .fewestRows = kFewestRows});
   FitBlockCache(pasting.source, plan, 0);
-  const sys::OMPThreadCount threads(work.threads > 0 ? work.threads : sys::OMPGetMaxThreads());
+  const sys::OMPThreadCount threads(sys::OMPThreadsFor(work.threads));
   const bool checks = checkFirst && pasting.stopOnNoData;
   if (checks) {
     ProgressSpan checking(progress, 0, 0.3);

@@ -131,8 +131,7 @@ void RunRegridding(const ImageFilterOptions& options,
       source, regridding, noData, reader,
       static_cast<std::int64_t>(mostSourceBytes / static_cast<double>(sourceBytes)));
 
-  const sys::OMPThreadCount threads(options.threads > 0 ? options.threads
-                                                        : sys::OMPGetMaxThreads());
+  const sys::OMPThreadCount threads(sys::OMPThreadsFor(options.threads));
   TerminalProgress progress(options.quiet);
   ProgressSpan moving(progress, 0, output.CopiesAtTheEnd() ? 0.5 : 0.99);
   ProgressSpan publishing(progress, output.CopiesAtTheEnd() ? 0.5 : 0.99, 1);

@@ -10,6 +10,8 @@ namespace zarn::sys {
 
 /// Threads that the next parallel region of the calling thread may use.
 ZARN_HOST_EXPORT int OMPGetMaxThreads();
+/// The threads that an option stands for: 0 means as many as the next region may use.
+inline int OMPThreadsFor(int option) { return option > 0 ? option : OMPGetMaxThreads(); }
 /// Threads of the innermost active parallel region; 1 outside.
 ZARN_HOST_EXPORT int OMPGetNumThreads();
 /// Number of the calling thread within its region, from 0.

@@ -90,8 +90,7 @@ class Planner {
       : options_(options), progress_(progress) {}
 
   Planning Make() {
-    const sys::OMPThreadCount threads(options_.work.threads > 0 ? options_.work.threads
-                                                                : sys::OMPGetMaxThreads());
+    const sys::OMPThreadCount threads(sys::OMPThreadsFor(options_.work.threads));
     CheckOptions();
     OpenScenes();
     LayGrid();

@@ -30,10 +30,6 @@ constexpr double kThreshold = 0.5;
 
 std::int64_t DivideUp(std::int64_t a, std::int64_t b) { return (a + b - 1) / b; }
 
-int ThreadsOf(const WorkOptions& work) {
-  return work.threads > 0 ? work.threads : sys::OMPGetMaxThreads();
-}
-
 // Where the lattice lies along the rows of a scene, those between its own need neither be copied
 // nor looked at, nor decoded if each is on its own. The blocks stay in GDAL's cache meanwhile.
 std::int64_t PixelsAtATime(const ScenePlan& scene, const Survey& survey, const WorkOptions& work) {
@@ -41,7 +37,7 @@ std::int64_t PixelsAtATime(const ScenePlan& scene, const Survey& survey, const W
   const std::int64_t blockRow = std::int64_t{source.Width()} * source.BlockHeight() *
                                 source.Dataset().GetRasterCount() *
                                 static_cast<std::int64_t>(source.Type().Bytes());
-  if (scene.place && blockRow * ThreadsOf(work) < GDALGetCacheMax64() / 2) {
+  if (scene.place && blockRow * sys::OMPThreadsFor(work.threads) < GDALGetCacheMax64() / 2) {
     return scene.covers.width + std::int64_t{2} * survey.step;
   }
   return std::min(kPiece, MostSourcePixels(survey.channels * survey.type.Bytes(), work));
@@ -129,7 +125,7 @@ void TakeSurvey(const std::vector<ScenePlan>& scenes, const WorkOptions& work, S
   std::size_t done = 0;
   std::exception_ptr failure;
   std::mutex mutex;
-  const int threads = ThreadsOf(work);
+  const int threads = sys::OMPThreadsFor(work.threads);
   // Scenes side by side need fewer threads to decode each; a handle for every block costs too.
   const auto readers = std::min(static_cast<std::size_t>(threads), scenes.size());
   const std::string decoders = std::to_string(DivideUp(threads, static_cast<int>(readers)));

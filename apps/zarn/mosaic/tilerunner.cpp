@@ -149,7 +149,7 @@ void RunTiles(const MosaicPlan& plan, const RasterSource& like, const std::vecto
     if (job.last) sink(tiles[job.tile], buffers[job.tile % kStreamSlots]);
     progress.Update(static_cast<double>(index + 1) / static_cast<double>(jobs.size()));
   };
-  const int count = work.threads > 0 ? work.threads : sys::OMPGetMaxThreads();
+  const int count = sys::OMPThreadsFor(work.threads);
   const sys::OMPThreadCount threads(count);
   if (count == 1) {
     RunOnOneThread(jobs.size(), kStreamSlots, {read, paste, write});
